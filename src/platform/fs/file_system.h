@@ -1,0 +1,78 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/clock.h"
+
+namespace trl::fs {
+
+// Attribute bits, as the component's home platform reports them.
+enum Attribute : uint16_t {
+  kReadOnly = 1,
+  kHidden = 2,
+  kSystem = 4,
+  kArchive = 32,
+};
+inline constexpr uint16_t kAllAttributes = kReadOnly | kHidden | kSystem | kArchive;
+
+// Random-access reading of one open file.
+class FileReader {
+ public:
+  virtual ~FileReader() = default;
+  virtual uint64_t Size() = 0;
+  // Reads up to `size` bytes at `offset`; returns how many were read (0 at the end).
+  virtual size_t ReadAt(uint64_t offset, void* buffer, size_t size) = 0;
+};
+
+class File {
+ public:
+  virtual ~File() = default;
+  // The name as the file system gives it, case kept, reversibly made XML-safe (see NameFromNative).
+  virtual std::string Name() const = 0;
+  // The path in the component's "\" form: the folder's Path, "\" and Name.
+  virtual std::string Path() const = 0;
+  // The attribute word restricted to the `wanted` bits: only what is needed to decide those bits is
+  // read from the file system, so a caller that needs no read-only bit causes no stat.
+  virtual uint16_t Attributes(uint16_t wanted = kAllAttributes) const = 0;
+  virtual uint64_t Size() const = 0;
+  virtual DateTime DateLastModified() const = 0;
+  virtual std::unique_ptr<FileReader> Open() const = 0;
+};
+
+class Folder;
+template <class T>
+using Collection = std::vector<std::unique_ptr<T>>;  // Count is size()
+
+class Folder {
+ public:
+  virtual ~Folder() = default;
+  virtual std::string Name() const = 0;  // "" for the root of a drive
+  virtual std::string Path() const = 0;  // "\" form, no trailing "\" except for a root
+  virtual uint16_t Attributes(uint16_t wanted = kAllAttributes) const = 0;
+  virtual bool IsRootFolder() const = 0;
+  // The folder's files and subfolders in the order the file system lists them. The folder is
+  // listed once, on the first call of either. A folder that cannot be listed fails with
+  // kPermissionDenied (70) or kPathNotFound (76). A link to a folder is not a subfolder (a walk
+  // never loops); a link to a file is a file; a dangling link is neither.
+  virtual const Collection<File>& Files() = 0;
+  virtual const Collection<Folder>& SubFolders() = 0;
+};
+
+// The file system as the component sees it: paths with "\" separators, names that match
+// regardless of case, network paths "\\host\share\..." like local ones.
+class FileSystem {
+ public:
+  virtual ~FileSystem() = default;
+  virtual bool FileExists(std::string_view path) = 0;
+  virtual bool FolderExists(std::string_view path) = 0;
+  // Fail with kFileNotFound (53) / kPathNotFound (76) when there is no such item, with
+  // kPermissionDenied (70) when it cannot be reached.
+  virtual std::unique_ptr<File> GetFile(std::string_view path) = 0;
+  virtual std::unique_ptr<Folder> GetFolder(std::string_view path) = 0;
+};
+
+}  // namespace trl::fs
