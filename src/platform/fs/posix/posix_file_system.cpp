@@ -1,0 +1,154 @@
+#include "platform/fs/posix/posix_file_system.h"
+
+#include <dirent.h>
+
+#include <cerrno>
+#include <optional>
+
+#include "platform/failure.h"
+#include "platform/fs/component_path.h"
+#include "platform/fs/posix/folder_place.h"
+#include "platform/fs/posix/name_resolver.h"
+#include "platform/fs/posix/posix_file.h"
+#include "platform/fs/posix/posix_folder.h"
+#include "platform/fs/posix/sys_calls.h"
+#include "platform/text.h"
+
+namespace trl::fs::posix {
+namespace {
+
+// What a path names, once found.
+struct Item {
+  std::string native;
+  std::string path;        // component form, the last name spelt as the file system spells it
+  std::string nativeName;  // "" for a root
+  bool shareRoot = false;
+  bool mustBeFolder = false;  // the path ended with a separator
+  ItemStatus status;
+};
+
+std::string ParentOf(const std::string& path, char separator) {
+  auto last = path.rfind(separator);
+  if (last == std::string::npos) return "";
+  return last == 0 ? std::string(1, separator) : path.substr(0, last);
+}
+
+// Not safe for use by several threads at once: a run owns one.
+class PosixFileSystem final : public FileSystem {
+ public:
+  explicit PosixFileSystem(ShareTable shares) : shares_(std::move(shares)) {}
+
+  bool FileExists(std::string_view path) override {
+    Item item;
+    return Find(path, item) == 0 && !S_ISDIR(item.status.mode) && !item.mustBeFolder;
+  }
+
+  bool FolderExists(std::string_view path) override {
+    Item item;
+    return Find(path, item) == 0 && S_ISDIR(item.status.mode);
+  }
+
+  std::unique_ptr<File> GetFile(std::string_view path) override {
+    Item item;
+    if (int error = Find(path, item)) Fail(LookupFailure(error, kFileNotFound));
+    if (S_ISDIR(item.status.mode) || item.mustBeFolder) Fail(kFileNotFound);
+    auto folder =
+        std::make_shared<FolderPlace>(ParentOf(item.native, '/'), ParentOf(item.path, '\\'));
+    // Following the link, a regular file is not a system file whether or not it was reached
+    // through a link; anything else needs an lstat to decide.
+    unsigned char type = S_ISREG(item.status.mode) ? DT_REG : DT_UNKNOWN;
+    return std::make_unique<PosixFile>(std::move(folder), std::move(item.nativeName), type,
+                                       item.status);
+  }
+
+  std::unique_ptr<Folder> GetFolder(std::string_view path) override {
+    Item item;
+    if (int error = Find(path, item)) Fail(LookupFailure(error, kPathNotFound));
+    if (!S_ISDIR(item.status.mode)) Fail(kPathNotFound);
+    auto place = std::make_shared<FolderPlace>(std::move(item.native), std::move(item.path));
+    return std::make_unique<PosixFolder>(std::move(place), std::move(item.nativeName),
+                                         item.shareRoot, item.status);
+  }
+
+ private:
+  // Returns 0 and the item `text` names, or an errno value (ENOENT for a network path that
+  // leads nowhere).
+  int Find(std::string_view text, Item& item) {
+    if (last_ && lastText_ == text) {
+      item = *last_;
+      return 0;
+    }
+    last_.reset();
+    auto path = ParseComponentPath(text);
+    std::string native;
+    struct stat status {};
+    if (int error = Locate(path, native, status)) return error;
+    item.shareRoot = path.network && path.components.size() == 2;
+    if (item.shareRoot && !S_ISDIR(status.st_mode)) return ENOTDIR;
+
+    item.native = std::move(native);
+    if (!item.shareRoot && !path.components.empty()) {
+      // The last name as found, unless the path ends at the folder a share leads to: that
+      // folder's own name is not part of the path.
+      std::string found = item.native.substr(item.native.rfind('/') + 1);
+      std::string given = NameToNative(path.components.back());
+      if (found == given || LowerCase(found) == LowerCase(given)) {
+        path.components.back() = NameFromNative(found);
+        given = std::move(found);
+      }
+      item.nativeName = std::move(given);
+    }
+    item.path = path.Text();
+    item.mustBeFolder = path.trailingSeparator;
+    item.status = ToItemStatus(status);
+    if (S_ISDIR(status.st_mode)) {
+      lastText_ = text;
+      last_ = item;
+    }
+    return 0;
+  }
+
+  // Finds the native item `path` names: through the share table for a network path, with one
+  // stat when the spelling is exact, else through the resolver. Returns 0 or an errno value.
+  int Locate(const ComponentPath& path, std::string& native, struct stat& status) {
+    ComponentPath local = path;
+    if (path.network) {
+      if (path.components.size() < 2) return ENOENT;
+      auto directory = shares_.Resolve(path.Text());
+      if (!directory) return ENOENT;
+      local = ParseComponentPath(*directory);
+    }
+    if (!local.absolute && local.components.empty()) return ENOENT;
+    std::vector<std::string> names;
+    names.reserve(local.components.size());
+    native = local.absolute ? "/" : "";
+    for (const auto& component : local.components) {
+      names.push_back(NameToNative(component));
+      native = JoinPath(native, names.back(), '/');
+    }
+    int error = Stat(native, status);
+    if (error != ENOENT && error != ENOTDIR) return error;
+    error = resolver_.Resolve(local.absolute, names, native);
+    return error != 0 ? error : Stat(native, status);
+  }
+
+  ShareTable shares_;
+  NameResolver resolver_;
+  // A walker asks about each subfolder it has listed three times running, with one text:
+  // FileExists, FolderExists and GetFolder of the subfolder's Path and "\". The last folder found
+  // is remembered with its text, so the three cost one stat; any other lookup drops it, and files
+  // are never remembered, so a file's coming and going is seen at once.
+  std::string lastText_;
+  std::optional<Item> last_;
+};
+
+}  // namespace
+}  // namespace trl::fs::posix
+
+namespace trl::fs {
+
+std::unique_ptr<FileSystem> CreatePosixFileSystem(ShareTable shares) {
+  return std::make_unique<posix::PosixFileSystem>(std::move(shares));
+}
+
+}  // namespace trl::fs

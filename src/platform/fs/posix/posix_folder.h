@@ -1,0 +1,43 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "platform/fs/file_system.h"
+#include "platform/fs/posix/folder_place.h"
+
+namespace trl::fs::posix {
+
+// A folder of a POSIX file system, listed in one readdir pass on first use of Files or SubFolders.
+class PosixFolder final : public Folder {
+ public:
+  // `nativeName` is "" for a root: "/" or the folder a share leads to (`shareRoot`).
+  PosixFolder(std::shared_ptr<FolderPlace> place, std::string nativeName, bool shareRoot,
+              std::optional<ItemStatus> status = std::nullopt)
+      : place_(std::move(place)),
+        nativeName_(std::move(nativeName)),
+        shareRoot_(shareRoot),
+        status_(status) {}
+
+  std::string Name() const override;
+  std::string Path() const override { return place_->Path(); }
+  uint16_t Attributes(uint16_t wanted) const override;
+  bool IsRootFolder() const override;
+  const Collection<File>& Files() override;
+  const Collection<Folder>& SubFolders() override;
+
+ private:
+  const ItemStatus& Status() const;
+  void List();
+
+  std::shared_ptr<FolderPlace> place_;
+  std::string nativeName_;
+  bool shareRoot_;
+  mutable std::optional<ItemStatus> status_;
+  bool listed_ = false;
+  Collection<File> files_;
+  Collection<Folder> subFolders_;
+};
+
+}  // namespace trl::fs::posix

@@ -1,0 +1,39 @@
+#pragma once
+
+#include <dirent.h>
+#include <sys/stat.h>
+
+#include <cstdint>
+#include <string>
+
+// The system calls the POSIX layer makes about items, in one place so that each is counted. The
+// counts exist for tests, which use them to prove that a walk asks the file system nothing it does
+// not need (an unwanted stat per file is invisible otherwise); they cost one increment per call.
+
+namespace trl::fs::posix {
+
+struct SysCallCounts {
+  uint64_t stat = 0;  // stat and lstat
+  uint64_t statfs = 0;
+  uint64_t getxattr = 0;
+  uint64_t opendir = 0;
+};
+
+// The calls this thread has made so far.
+SysCallCounts CountedSysCalls();
+
+// Each returns 0 or the errno value.
+int Stat(const std::string& path, struct stat& out);
+int LStat(const std::string& path, struct stat& out);
+int FileSystemType(const std::string& path, int64_t& type);
+// The value of extended attribute `name`, or "" when it cannot be read.
+std::string GetExtendedAttribute(const std::string& path, const char* name);
+// nullptr with errno set on failure; an empty path is the working directory.
+DIR* OpenDirectory(const std::string& path);
+
+// Failure numbers for errno values: looking an item up (`notFound` when it does not exist),
+// and listing a folder.
+int32_t LookupFailure(int error, int32_t notFound);
+int32_t ListingFailure(int error);
+
+}  // namespace trl::fs::posix
