@@ -53,7 +53,7 @@ class Node {
   // Tree changes. A node of this document moves (handles to it stay valid); a node of another
   // document is copied here and removed from its own document: use the returned handle.
   Node AppendChild(Node child);
-  Node InsertBefore(Node child, Node reference);  // reference no object: append
+  Node InsertBefore(Node child, Node reference);    // reference no object: append
   Node ReplaceChild(Node newChild, Node oldChild);  // returns the handle of the inserted node
   // Removes and destroys the child and everything below it; handles to them become invalid.
   void RemoveChild(Node child);
@@ -105,7 +105,7 @@ class Document {
   // The whole document, raw, without declaration; "" when it has no content.
   std::string Xml() const;
 
-  Node AsNode();  // the document node itself: selections from here start at the root
+  Node AsNode();           // the document node itself: selections from here start at the root
   Node DocumentElement();  // no object when there is none
   // Makes `element` the document element, in place of the current one if any. An element of
   // another document is copied (see Node::AppendChild); returns the handle in this document.

@@ -13,6 +13,8 @@ std::string StandardDescription(int32_t number) {
       return "Invalid procedure call or argument";
     case kOverflow:
       return "Overflow";
+    case kOutOfMemory:
+      return "Out of memory";
     case kDivisionByZero:
       return "Division by zero";
     case kTypeMismatch:

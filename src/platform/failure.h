@@ -10,6 +10,7 @@ namespace trl {
 enum FailureNumber : int32_t {
   kInvalidArgument = 5,
   kOverflow = 6,
+  kOutOfMemory = 7,
   kDivisionByZero = 11,
   kTypeMismatch = 13,
   kFileNotFound = 53,

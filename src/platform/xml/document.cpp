@@ -1,0 +1,208 @@
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <atomic>
+#include <fstream>
+#include <sstream>
+
+#include "platform/failure.h"
+#include "platform/text.h"
+#include "platform/xml/document_impl.h"
+#include "platform/xml/name.h"
+
+namespace trl::xml {
+namespace {
+
+// The parser's defaults keep no comments, no processing instructions and no declaration, and drop
+// text between elements that is only white space.
+constexpr unsigned kParseOptions = pugi::parse_default | pugi::parse_comments | pugi::parse_pi;
+
+std::atomic<uint64_t> lastSerial{0};
+
+ParseError ErrorAt(const pugi::xml_parse_result& result, std::string_view text) {
+  auto before = text.substr(0, static_cast<size_t>(result.offset));
+  auto lineStart = before.rfind('\n');
+  auto column = lineStart == std::string_view::npos ? before.size() : before.size() - lineStart - 1;
+  return {false, result.description(), std::count(before.begin(), before.end(), '\n') + 1,
+          static_cast<int64_t>(column) + 1};
+}
+
+}  // namespace
+
+pugi::xml_node Require(const Node& node) {
+  if (node.IsNull()) Fail(kObjectNotSet);
+  return ToPugi(node);
+}
+
+void CheckName(std::string_view name) {
+  if (!IsXmlName(name)) Fail(kInvalidArgument, fmt::format("\"{}\" is not a valid XML name", name));
+}
+
+void CheckText(std::string_view text) {
+  if (!IsValidUtf8(text) || !IsXmlSafe(text)) {
+    Fail(kInvalidArgument, "The text is not UTF-8 that an XML document can carry");
+  }
+}
+
+void FailOutOfMemory() { Fail(kOutOfMemory); }
+
+Document::Impl::Impl(Document& owner) : owner(owner), serial(++lastSerial) {}
+
+void Document::Impl::Reset(ParseError error) {
+  index.Clear();
+  holder = pugi::xml_node();
+  doc.reset();
+  parseError = std::move(error);
+  Changed();
+}
+
+bool Document::Impl::Load(const char* data, size_t size, pugi::xml_encoding encoding) {
+  Reset(ParseError{});
+  pugi::xml_parse_result result = doc.load_buffer(data, size, kParseOptions, encoding);
+  if (result) return true;
+  // pugixml keeps what it parsed before the error.
+  Reset(ErrorAt(result, std::string_view(data, size)));
+  return false;
+}
+
+pugi::xml_node Document::Impl::Holder() {
+  if (!holder) {
+    // Not a valid XML name, so no selection by name and no find by tag can meet it.
+    holder = doc.append_child("#detached");
+    if (!holder) FailOutOfMemory();
+  }
+  return holder;
+}
+
+pugi::xml_node Document::Impl::FragmentOf(pugi::xml_node node) const {
+  for (pugi::xml_node at = node; at; at = at.parent()) {
+    if (at == holder) return holder;
+    if (at.parent() == holder) return at;
+  }
+  return doc;
+}
+
+void Document::Impl::CheckPlacement(pugi::xml_node parent, pugi::xml_node child,
+                                    pugi::xml_node replacing) const {
+  if (parent.type() != pugi::node_element && parent.type() != pugi::node_document) {
+    Fail(kInvalidArgument, "Only elements and documents have child nodes");
+  }
+  if (child.type() == pugi::node_document) {
+    Fail(kInvalidArgument, "A document cannot be placed in another node");
+  }
+  if (parent.type() == pugi::node_document) {
+    if (child.type() == pugi::node_pcdata || child.type() == pugi::node_cdata) {
+      Fail(kInvalidArgument, "Text cannot stand outside the document element");
+    }
+    if (child.type() == pugi::node_element) {
+      for (pugi::xml_node other : doc.children()) {
+        if (other.type() == pugi::node_element && other != holder && other != child &&
+            other != replacing) {
+          Fail(kInvalidArgument, "The document has a document element already");
+        }
+      }
+    }
+  }
+}
+
+pugi::xml_node Document::Impl::Place(pugi::xml_node parent, const Node& child,
+                                     pugi::xml_node before, pugi::xml_node replacing) {
+  Impl& source = *child.OwnerDocument().impl_;
+  pugi::xml_node node = ToPugi(child);
+  CheckPlacement(parent, node, replacing);
+  if (!before && parent == doc && holder) before = holder;
+  pugi::xml_node placed;
+  if (&source == this) {
+    pugi::xml_node from = node.parent();
+    // Checked above but for one case, which pugixml refuses before it changes anything.
+    placed = before ? parent.insert_move_before(node, before) : parent.append_move(node);
+    if (!placed) Fail(kInvalidArgument, "A node cannot be placed under itself or its descendant");
+    index.ChildLeaving(from, node);
+  } else {
+    placed = before ? parent.insert_copy_before(node, before) : parent.append_copy(node);
+    if (!placed) FailOutOfMemory();
+    source.Destroy(node);
+  }
+  if (replacing) {
+    index.ChildLeaving(parent, replacing);
+    index.SubtreeDestroying(replacing);
+    parent.remove_child(replacing);
+  }
+  index.ChildArrived(parent, placed);
+  Changed();
+  return placed;
+}
+
+void Document::Impl::Destroy(pugi::xml_node node) {
+  pugi::xml_node parent = node.parent();
+  index.ChildLeaving(parent, node);
+  index.SubtreeDestroying(node);
+  parent.remove_child(node);
+  Changed();
+}
+
+Document::Document() : impl_(std::make_unique<Impl>(*this)) {}
+
+Document::~Document() = default;
+
+bool Document::LoadXml(std::string_view text) {
+  return impl_->Load(text.data(), text.size(), pugi::encoding_utf8);
+}
+
+bool Document::Load(const std::string& path) {
+  std::ifstream in(path, std::ios::binary);
+  if (!in) {
+    pugi::xml_parse_result missing;
+    missing.status = pugi::status_file_not_found;
+    impl_->Reset(ParseError{false, missing.description(), 0, 0});
+    return false;
+  }
+  std::ostringstream text;
+  text << in.rdbuf();
+  std::string content = std::move(text).str();
+  return impl_->Load(content.data(), content.size(), pugi::encoding_auto);
+}
+
+const ParseError& Document::LastParseError() const { return impl_->parseError; }
+
+std::string Document::Xml() const { return impl_->Wrap(impl_->doc).Xml(); }
+
+Node Document::AsNode() { return impl_->Wrap(impl_->doc); }
+
+Node Document::DocumentElement() {
+  for (pugi::xml_node child : impl_->doc.children()) {
+    if (child.type() == pugi::node_element && child != impl_->holder) return impl_->Wrap(child);
+  }
+  return Node();
+}
+
+Node Document::SetDocumentElement(Node element) {
+  pugi::xml_node node = Require(element);
+  if (node.type() != pugi::node_element) {
+    Fail(kInvalidArgument, "Only an element can be the document element");
+  }
+  pugi::xml_node current = ToPugi(DocumentElement());
+  if (current == node) return element;
+  return impl_->Wrap(impl_->Place(impl_->doc, element, current, current));
+}
+
+Node Document::CreateElement(std::string_view tag) {
+  CheckName(tag);
+  pugi::xml_node element = impl_->Holder().append_child(std::string(tag).c_str());
+  if (!element) FailOutOfMemory();
+  return impl_->Wrap(element);
+}
+
+Node Document::FindChild(Node parent, std::string_view tag, std::string_view attr,
+                         std::string_view value) {
+  pugi::xml_node node = Require(parent);
+  Document& owner = parent.OwnerDocument();
+  if (&owner != this) return owner.FindChild(parent, tag, attr, value);
+  return impl_->Wrap(impl_->index.Find(node, tag, attr, value));
+}
+
+uint64_t Document::ModificationCount() const { return impl_->modifications; }
+
+uint64_t Document::Serial() const { return impl_->serial; }
+
+}  // namespace trl::xml

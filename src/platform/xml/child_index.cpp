@@ -1,0 +1,104 @@
+#include "platform/xml/child_index.h"
+
+#include <algorithm>
+#include <optional>
+
+#include "platform/xml/tree_walk.h"
+
+namespace trl::xml {
+namespace {
+
+std::optional<std::string_view> KeyOf(pugi::xml_node child, std::string_view tag,
+                                      const std::string& attr) {
+  if (child.type() != pugi::node_element || tag != child.name()) return std::nullopt;
+  pugi::xml_attribute key = child.attribute(attr.c_str());
+  if (!key) return std::nullopt;
+  return std::string_view(key.value());
+}
+
+}  // namespace
+
+pugi::xml_node ChildIndex::Find(pugi::xml_node parent, std::string_view tag, std::string_view attr,
+                                std::string_view value) {
+  auto& indexes = byParent_[parent.internal_object()];
+  auto it = std::find_if(indexes.begin(), indexes.end(), [&](const KeyIndex& index) {
+    return index.tag == tag && index.attr == attr;
+  });
+  if (it == indexes.end()) it = indexes.insert(it, Build(parent, tag, attr));
+  auto found = it->first.find(value);
+  return found == it->first.end() ? pugi::xml_node() : pugi::xml_node(found->second);
+}
+
+ChildIndex::KeyIndex ChildIndex::Build(pugi::xml_node parent, std::string_view tag,
+                                       std::string_view attr) {
+  KeyIndex index{std::string(tag), std::string(attr), {}, false};
+  for (pugi::xml_node child : parent.children()) {
+    auto key = KeyOf(child, index.tag, index.attr);
+    if (key && !index.first.try_emplace(*key, child.internal_object()).second) {
+      index.hasDuplicates = true;
+    }
+  }
+  return index;
+}
+
+bool ChildIndex::Insert(KeyIndex& index, pugi::xml_node child) {
+  auto key = KeyOf(child, index.tag, index.attr);
+  if (!key || index.first.try_emplace(*key, child.internal_object()).second) return true;
+  // Another child holds the key already; it surely comes first only when this one is the last.
+  if (child.next_sibling()) return false;
+  index.hasDuplicates = true;
+  return true;
+}
+
+bool ChildIndex::Erase(KeyIndex& index, pugi::xml_node child) {
+  auto key = KeyOf(child, index.tag, index.attr);
+  if (!key) return true;
+  auto found = index.first.find(*key);
+  // A later holder of a key leaves the answers as they are.
+  if (found == index.first.end() || found->second != child.internal_object()) return true;
+  if (index.hasDuplicates) return false;
+  index.first.erase(found);
+  return true;
+}
+
+template <typename Change>
+void ChildIndex::Update(pugi::xml_node parent, Change change) {
+  if (byParent_.empty()) return;
+  auto it = byParent_.find(parent.internal_object());
+  if (it == byParent_.end()) return;
+  std::erase_if(it->second, [&](KeyIndex& index) { return !change(index); });
+  if (it->second.empty()) byParent_.erase(it);
+}
+
+void ChildIndex::ChildArrived(pugi::xml_node parent, pugi::xml_node child) {
+  Update(parent, [&](KeyIndex& index) { return Insert(index, child); });
+}
+
+void ChildIndex::ChildLeaving(pugi::xml_node parent, pugi::xml_node child) {
+  Update(parent, [&](KeyIndex& index) { return Erase(index, child); });
+}
+
+void ChildIndex::KeyChanging(pugi::xml_node child, std::string_view attr) {
+  Update(child.parent(),
+         [&](KeyIndex& index) { return index.attr != attr || Erase(index, child); });
+}
+
+void ChildIndex::KeyChanged(pugi::xml_node child, std::string_view attr) {
+  Update(child.parent(),
+         [&](KeyIndex& index) { return index.attr != attr || Insert(index, child); });
+}
+
+void ChildIndex::SubtreeDestroying(pugi::xml_node root) {
+  for (pugi::xml_node node = root; node && !byParent_.empty(); node = NextInSubtree(node, root)) {
+    byParent_.erase(node.internal_object());
+  }
+}
+
+void ChildIndex::ChildrenDestroying(pugi::xml_node parent) {
+  byParent_.erase(parent.internal_object());
+  for (pugi::xml_node child : parent.children()) SubtreeDestroying(child);
+}
+
+void ChildIndex::Clear() { byParent_.clear(); }
+
+}  // namespace trl::xml
