@@ -59,8 +59,9 @@ class Schema {
   // (f_id, f_name, f_weight, f_exists "0") and deep copies of the version's `n` and `o` children.
   xml::Node AddVersion(xml::Node version, xml::Node application);
 
-  // Whether the application takes part: the a_selected of the first `a` of the options with the
-  // application's a_id, else the options root's a_selected, else "1"; "0" means not selected.
+  // Whether the application takes part: an application the options list (the first `a` with its
+  // a_id) is selected unless that `a` has a_selected "0"; one they do not list follows the options
+  // root's a_selected, selected when it is absent.
   // Answers from an index of the options, rebuilt when the options change.
   bool IsApplicationSelected(xml::Node application, xml::Document& options);
 

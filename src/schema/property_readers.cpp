@@ -1,0 +1,57 @@
+#include <openssl/evp.h>
+
+#include <array>
+#include <memory>
+#include <vector>
+
+#include "platform/failure.h"
+#include "schema/pe_version.h"
+#include "schema/schema.h"
+
+namespace trl {
+namespace {
+
+constexpr size_t kDigestChunk = size_t{1} << 20;
+
+// The MD5 digest of everything the reader gives, in lower-case hex.
+std::string Md5Hex(fs::FileReader& reader) {
+  std::unique_ptr<EVP_MD_CTX, decltype(&EVP_MD_CTX_free)> context(EVP_MD_CTX_new(),
+                                                                  &EVP_MD_CTX_free);
+  if (!context || EVP_DigestInit_ex(context.get(), EVP_md5(), nullptr) != 1) {
+    Fail(kInvalidArgument, "MD5 digest unavailable");
+  }
+  std::vector<unsigned char> buffer(kDigestChunk);
+  uint64_t offset = 0;
+  while (size_t got = reader.ReadAt(offset, buffer.data(), buffer.size())) {
+    EVP_DigestUpdate(context.get(), buffer.data(), got);
+    offset += got;
+  }
+  std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};
+  unsigned int length = 0;
+  EVP_DigestFinal_ex(context.get(), digest.data(), &length);
+
+  static constexpr char kHex[] = "0123456789abcdef";
+  std::string text;
+  text.reserve(length * 2);
+  for (unsigned int i = 0; i < length; ++i) {
+    text.push_back(kHex[digest[i] >> 4]);
+    text.push_back(kHex[digest[i] & 0xF]);
+  }
+  return text;
+}
+
+}  // namespace
+
+std::string Schema::ReadPropertyType1(const fs::File& file) const {
+  return ReadPeFileVersion(*file.Open());
+}
+
+int64_t Schema::ReadPropertyType2(const fs::File& file) const {
+  return static_cast<int64_t>(file.Size());
+}
+
+std::string Schema::ReadPropertyType3(const fs::File& file) const { return Md5Hex(*file.Open()); }
+
+DateTime Schema::ReadPropertyType4(const fs::File& file) const { return file.DateLastModified(); }
+
+}  // namespace trl
