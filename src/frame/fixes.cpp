@@ -1,0 +1,94 @@
+#include "frame/fixes.h"
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/general.h"
+#include "frame/vocabulary.h"
+#include "platform/convert.h"
+#include "schema/schema.h"
+
+namespace trl {
+namespace {
+
+// Moves a plain name written in the older form (only in `nameAttr`) to `textAttr` and encodes it.
+void UpgradeName(const OnError& on, const Schema& schema, xml::Node node, std::string_view textAttr,
+                 std::string_view nameAttr) {
+  bool older = false;
+  on([&] { older = FixNulls(node.GetAttribute(textAttr), std::string()).empty(); });
+  if (!older) return;
+  on([&] { node.SetAttribute(textAttr, TextOf(node, nameAttr)); });
+  on([&] { node.SetAttribute(nameAttr, schema.EncodeName(TextOf(node, nameAttr))); });
+}
+
+}  // namespace
+
+void UpgradeUserData(xml::Document& document) {
+  OnError on{kFixesModule, "UpgradeUserData"};
+  Schema schema;
+  std::string cId, mId, dId, aId;
+
+  std::vector<xml::Node> computers;
+  on([&] { computers = document.DocumentElement().SelectNodes("//c"); });
+  for (xml::Node c : computers) {
+    on([&] { cId = TextOf(c, vocab::c_id); });
+    UpgradeName(on, schema, c, vocab::c_text, vocab::c_name);
+
+    std::vector<xml::Node> drives;
+    on([&] { drives = c.SelectNodes("./m"); });
+    for (xml::Node m : drives) {
+      on([&] { mId = TextOf(m, vocab::m_id); });
+      UpgradeName(on, schema, m, vocab::m_text, vocab::m_name);
+
+      std::vector<xml::Node> folders;
+      on([&] { folders = m.SelectNodes("./d"); });
+      for (xml::Node d : folders) {
+        on([&] { dId = TextOf(d, vocab::d_id); });
+        std::vector<xml::Node> applications;
+        on([&] { applications = d.SelectNodes("./a"); });
+        for (xml::Node a : applications) {
+          on([&] { aId = TextOf(a, vocab::a_id); });
+          on([&] { a.SetAttribute(vocab::a_guid, "c" + cId + "m" + mId + "d" + dId + "a" + aId); });
+        }
+      }
+    }
+  }
+}
+
+void UpgradeFingerprintData(xml::Document& fingerprint) {
+  OnError on{kFixesModule, "UpgradeFingerprintData"};
+  // A weight that cannot be read falls back to the one read before it in this call.
+  int32_t fileWeight = 0;
+  int32_t propertyWeight = 0;
+
+  std::vector<xml::Node> versions;
+  on([&] { versions = fingerprint.DocumentElement().SelectNodes("//v"); });
+  for (xml::Node v : versions) {
+    int32_t versionSum = 0;
+    std::vector<xml::Node> files;
+    on([&] { files = v.SelectNodes(".//f"); });
+    for (xml::Node f : files) {
+      on([&] { fileWeight = ToInt32(TextOf(f, vocab::f_weight)); });
+      int32_t fileBit = CalculateWeightMask(fileWeight);
+      on([&] { versionSum = CheckedAdd(versionSum, fileBit); });
+      on([&] { f.SetAttribute(vocab::f_bitmask, std::to_string(fileBit)); });
+
+      int32_t fileSum = 0;
+      std::vector<xml::Node> properties;
+      on([&] { properties = f.SelectNodes("./p"); });
+      for (xml::Node p : properties) {
+        on([&] { propertyWeight = ToInt32(TextOf(p, vocab::p_weight)); });
+        int32_t propertyBit = CalculateWeightMask(propertyWeight);
+        on([&] { fileSum = CheckedAdd(fileSum, propertyBit); });
+        on([&] { p.SetAttribute(vocab::p_bitmask, std::to_string(propertyBit)); });
+      }
+      on([&] { f.SetAttribute(vocab::p_max, std::to_string(fileSum)); });
+    }
+    on([&] { v.SetAttribute(vocab::v_max, std::to_string(versionSum)); });
+  }
+}
+
+}  // namespace trl

@@ -1,0 +1,72 @@
+#include "frame/general.h"
+
+#include <gtest/gtest.h>
+
+#include <optional>
+#include <string>
+
+#include "frame/error_handler.h"
+#include "support/reported_events.h"
+
+namespace trl {
+namespace {
+
+TEST(FixNullsTest, OnlyAnAbsentValueTakesTheDefault) {
+  EXPECT_EQ(FixNulls<std::string>(std::nullopt, "33"), "33");
+  EXPECT_EQ(FixNulls<std::string>(std::string(), "33"), "");
+  EXPECT_EQ(FixNulls<std::string>(std::string("1"), "33"), "1");
+  EXPECT_EQ(FixNulls<int>(0, 7), 0);
+}
+
+TEST(CalculateWeightMaskTest, WeightsBecomeBitValues) {
+  struct Case {
+    int32_t weight;
+    int32_t bit;
+  } cases[] = {{-3, 0},    {0, 0},      {1, 1},      {2, 2},           {3, 4},        {8, 128},
+               {14, 8192}, {15, 16384}, {16, 16384}, {1000000, 16384}, {INT32_MIN, 0}};
+  for (const auto& c : cases) EXPECT_EQ(CalculateWeightMask(c.weight), c.bit) << c.weight;
+}
+
+class AddEventsXmlTest : public ::testing::Test {
+ protected:
+  void SetUp() override { ReleaseSharedReporter(); }
+  void TearDown() override { ReleaseSharedReporter(); }
+};
+
+TEST_F(AddEventsXmlTest, WithoutASharedReporterNothingChanges) {
+  xml::Document results;
+  ASSERT_TRUE(results.LoadXml("<trl_applicationdata><c/></trl_applicationdata>"));
+  EXPECT_FALSE(AddEventsXML(results));
+  EXPECT_EQ(SharedReporter(), nullptr) << "must not create the reporter";
+  EXPECT_EQ(results.Xml(), "<trl_applicationdata><c/></trl_applicationdata>");
+}
+
+TEST_F(AddEventsXmlTest, EventsAreAppendedLastAndTheReporterIsReset) {
+  HandleEvent(6, "Overflow", 1, "trlLocator", "Search", "Search", false, false, "x", 0, true);
+  HandleEvent(7, "Out of memory", 1, "trlLocator", "Search", "AddFile", false, false, "y", 0, true);
+  xml::Document results;
+  ASSERT_TRUE(results.LoadXml("<trl_applicationdata><c/></trl_applicationdata>"));
+  EXPECT_TRUE(AddEventsXML(results));
+
+  auto children = results.DocumentElement().ChildNodes();
+  ASSERT_EQ(children.size(), 2u);
+  EXPECT_EQ(children[1].NodeName(), "events");
+  auto events = results.AsNode().SelectNodes("//event");
+  ASSERT_EQ(events.size(), 2u);
+  EXPECT_EQ(events[1].GetAttribute("procedure"), "AddFile");
+  EXPECT_TRUE(testing::TakeReportedEvents().empty());
+  EXPECT_EQ(SharedReporter()->Count(1), 0);
+}
+
+TEST_F(AddEventsXmlTest, ResultsWithoutRootReportTheFailureAndStillReset) {
+  HandleEvent(6, "Overflow", 1, "trlLocator", "Search", "Search", false, false, "", 0, true);
+  xml::Document results;
+  EXPECT_TRUE(AddEventsXML(results));
+  EXPECT_EQ(results.Xml(), "");
+  // The failed append was reported before the resets, which then cleared it with the rest.
+  EXPECT_TRUE(testing::TakeReportedEvents().empty());
+  EXPECT_EQ(SharedReporter()->Count(1), 0);
+}
+
+}  // namespace
+}  // namespace trl
