@@ -24,6 +24,7 @@ inline constexpr int16_t kStatusCancelled = 255;
 // a moment later (asynchronous, the default) while the client follows StatusUpdate and
 // ProgressUpdate; Status tells where the run stands and Cancel stops a running one. No failure ever
 // leaves a public member: failures are reported to the thread's reporter and the work goes on.
+// A client must not destroy a worker from inside one of that worker's events.
 class Worker {
  public:
   using StatusUpdateHandler =
@@ -83,8 +84,12 @@ class Worker {
   int16_t status_ = kStatusIdle;
 
  private:
+  std::string StartSteps(const std::function<void()>& prepare);
   void ArmTicker();
   void brxTicker_Tick();
+  void TickSteps();
+  // Keeps any failure, even one of the reporter itself, from leaving a public member or a tick.
+  void LastResort(const std::function<void()>& steps);
   void ReportCreationFailure(std::string_view progId);
   bool RunCreation(const std::function<void()>& create);
 

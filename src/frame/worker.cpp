@@ -1,5 +1,7 @@
 #include "trl/worker.h"
 
+#include <cstdio>
+#include <exception>
 #include <string>
 
 #include "frame/error_handler.h"
@@ -21,6 +23,12 @@ void Worker::Cancel() {
 }
 
 std::string Worker::StartFrame(const std::function<void()>& prepare) {
+  std::string result;
+  LastResort([&] { result = StartSteps(prepare); });
+  return result;
+}
+
+std::string Worker::StartSteps(const std::function<void()>& prepare) {
   OnError on{className_, "Start"};
   if (status_ == kStatusCancelled) {
     status_ = kStatusIdle;
@@ -53,6 +61,10 @@ void Worker::ArmTicker() {
 }
 
 void Worker::brxTicker_Tick() {
+  LastResort([&] { TickSteps(); });
+}
+
+void Worker::TickSteps() {
   OnError on{className_, "brxTicker_Tick"};
   // The timer is released on a later pass: this call runs inside its own Tick, and a client may
   // start this worker again from the run's last event, arming a new one.
@@ -117,6 +129,17 @@ void Worker::RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill) {
   fill(NewProgressElement());
   std::string update = progress_->Xml();
   if (progressUpdate_) progressUpdate_(update);
+}
+
+void Worker::LastResort(const std::function<void()>& steps) {
+  try {
+    steps();
+  } catch (const std::exception& error) {
+    // Only a reporter that cannot report gets here: nothing is left to tell but the console.
+    std::fprintf(stderr, "trlLocator: %s: %s\n", className_.c_str(), error.what());
+  } catch (...) {
+    std::fprintf(stderr, "trlLocator: %s: unexpected failure\n", className_.c_str());
+  }
 }
 
 bool Worker::RunCreation(const std::function<void()>& create) {

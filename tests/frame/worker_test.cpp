@@ -62,6 +62,7 @@ class TestWorker : public Worker {
 struct Recorder {
   std::vector<std::string> events;
   std::string lastResults;
+  std::string lastUpdate;
 
   void Attach(Worker& worker) {
     worker.OnStatusUpdate([this](const std::string& update, const std::string& results) {
@@ -70,6 +71,7 @@ struct Recorder {
       EXPECT_EQ(e.DocumentElement().GetAttribute("e_mode"), "7");
       events.push_back("S" + e.DocumentElement().GetAttribute("e_status").value_or("?"));
       lastResults = results;
+      lastUpdate = update;
     });
     worker.OnProgressUpdate([this](const std::string& update) {
       xml::Document e;
@@ -104,10 +106,12 @@ TEST(WorkerTest, AsynchronousRunReportsEveryStageInOrder) {
   EXPECT_EQ(worker.Status(), kStatusStarted);
   EXPECT_EQ(worker.runs, 0) << "the run must wait for a later pass of the loop";
   EXPECT_EQ(recorder.events, std::vector<std::string>{"S1"});
+  EXPECT_EQ(recorder.lastUpdate, R"(<e e_mode="7" e_status="1" e_done="0"/>)");
 
   ASSERT_TRUE(RunUntilSettled(worker));
   EXPECT_EQ(recorder.events, (std::vector<std::string>{"S1", "S2", "P0", "P1", "P2", "S3"}));
   EXPECT_EQ(recorder.lastResults, "<results/>");
+  EXPECT_EQ(recorder.lastUpdate, R"(<e e_mode="7" e_status="3" e_done="3"/>)");
   EXPECT_EQ(worker.Status(), kStatusComplete);
 }
 
