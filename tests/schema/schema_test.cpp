@@ -144,8 +144,8 @@ TEST(SchemaTest, FindOrAddAgreesWithAScanAfterOtherChanges) {
     }
     return xml::Node();
   };
-  for (unsigned seed : {1U, 2U, 3U}) {
-    std::mt19937 random(seed);
+  for (unsigned start : {1U, 2U, 3U}) {
+    std::mt19937 random(start);
     auto pick = [&](size_t n) { return std::uniform_int_distribution<size_t>(0, n - 1)(random); };
     Schema schema(kNoHostNames);
     auto document = Load("<d/>");
@@ -162,7 +162,8 @@ TEST(SchemaTest, FindOrAddAgreesWithAScanAfterOtherChanges) {
           xml::Node expected = scan(folder, name);
           int32_t before = counter;
           xml::Node found = schema.AddFileEntry(name, name, folder, counter);
-          ASSERT_EQ(found, expected ? expected : folder.ChildNodes().back()) << seed << ":" << step;
+          ASSERT_EQ(found, expected ? expected : folder.ChildNodes().back())
+              << start << ":" << step;
           ASSERT_EQ(counter, expected ? before : before + 1);
           break;
         }

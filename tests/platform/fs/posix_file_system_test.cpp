@@ -17,6 +17,7 @@
 #include "platform/fs/dos_attributes.h"
 #include "platform/fs/posix/sys_calls.h"
 #include "platform/text.h"
+#include "support/failure_of.h"
 #include "support/fault_injecting_file_system.h"
 #include "support/temp_tree.h"
 
@@ -29,14 +30,7 @@ using trl::testing::FaultInjectingFileSystem;
 using trl::testing::TempTree;
 
 // The failure number `action` raises, 0 when it raises none.
-int32_t FailureOf(const std::function<void()>& action) {
-  try {
-    action();
-  } catch (const Failure& failure) {
-    return failure.number;
-  }
-  return 0;
-}
+using testing::FailureOf;
 
 std::string ReadAll(const File& file) {
   auto reader = file.Open();

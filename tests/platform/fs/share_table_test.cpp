@@ -7,18 +7,12 @@
 
 #include "platform/failure.h"
 #include "platform/text.h"
+#include "support/failure_of.h"
 
 namespace trl::fs {
 namespace {
 
-int32_t FailureOf(const std::function<void()>& action) {
-  try {
-    action();
-  } catch (const Failure& failure) {
-    return failure.number;
-  }
-  return 0;
-}
+using testing::FailureOf;
 
 TEST(ShareTableTest, AddMappingTakesUncEqualsDirectoryOnly) {
   const std::tuple<const char*, const char*, const char*> accepted[] = {

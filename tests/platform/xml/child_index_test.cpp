@@ -24,7 +24,7 @@ const std::pair<const char*, const char*> kLookups[] = {{"f", "k"}, {"g", "k"}, 
 // FindChild answer with a scan of the children.
 class RandomChanges {
  public:
-  explicit RandomChanges(uint32_t seed) : random_(seed) {
+  explicit RandomChanges(uint32_t start) : random_(start) {
     for (Document& doc : docs_) doc.LoadXml(kStarts[0]);
   }
 
@@ -132,19 +132,20 @@ class RandomChanges {
   Document docs_[2];
 };
 
-void RunRandomChanges(uint32_t seed, int steps) {
-  RandomChanges changes(seed);
+void RunRandomChanges(uint32_t start, int steps) {
+  RandomChanges changes(start);
   for (int step = 0; step < steps; ++step) {
     changes.Step();
     std::string mismatch = changes.Mismatch();
-    ASSERT_TRUE(mismatch.empty()) << "seed " << seed << ", step " << step << ": " << mismatch;
+    ASSERT_TRUE(mismatch.empty()) << "random start " << start << ", step " << step << ": "
+                                  << mismatch;
   }
 }
 
 TEST(XmlChildIndexTest, AgreesWithAScanThroughRandomChanges) { RunRandomChanges(20240611, 4000); }
 
 TEST(XmlChildIndexTest, AgreesWithAScanForSeveralSeeds) {
-  for (uint32_t seed : {1u, 2u, 3u, 4u}) RunRandomChanges(seed, 1000);
+  for (uint32_t start : {1u, 2u, 3u, 4u}) RunRandomChanges(start, 1000);
 }
 
 // pugixml hands the memory of a freed subtree out again; a new parent at the same place must not

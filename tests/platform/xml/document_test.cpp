@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "platform/failure.h"
+#include "support/failure_of.h"
 #include "support/temp_tree.h"
 #include "trl/xml.h"
 
@@ -28,15 +29,7 @@ std::vector<std::string> Labels(const std::vector<Node>& nodes) {
   return labels;
 }
 
-// The failure number `action` raises, 0 when it succeeds.
-int32_t FailureOf(const std::function<void()>& action) {
-  try {
-    action();
-  } catch (const Failure& failure) {
-    return failure.number;
-  }
-  return 0;
-}
+using testing::FailureOf;
 
 TEST(XmlDocumentTest, SelectionsFollowXPathInDocumentOrder) {
   struct Case {
