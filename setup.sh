@@ -34,4 +34,7 @@ fi
 if [ ! -f "$build_dir/build.ninja" ]; then
   cmake -S "$here" -B "$build_dir" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
 fi
-cmake --build "$build_dir" -- --quiet
+if ! log=$(cmake --build "$build_dir" -- --quiet 2>&1); then
+  printf '%s\n' "$log" >&2
+  exit 1
+fi
