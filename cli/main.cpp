@@ -1,13 +1,36 @@
 #include <CLI/CLI.hpp>
+#include <cstdio>
+#include <functional>
+#include <vector>
 
-#include <iostream>
-
+#include "command_error.h"
+#include "search_command.h"
 #include "version.h"
 
 int main(int argc, char** argv) {
+  using namespace trl::cli;
   CLI::App app{"trllocator: finds which known applications are installed, and which version"};
   app.set_version_flag("--version", std::string("trllocator ") + TRL_VERSION);
-  CLI11_PARSE(app, argc, argv);
-  std::cout << app.help();
-  return 0;
+  app.footer(
+      "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
+      "2 a bad command line or input document.");
+  std::vector<std::function<int()>> commands{AddSearchCommand(app)};
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::Success& done) {
+    return app.exit(done);
+  } catch (const CLI::ParseError& error) {
+    app.exit(error);
+    return kExitBadInput;
+  }
+  try {
+    for (const auto& command : commands) {
+      if (int code = command(); code >= 0) return code;
+    }
+  } catch (const CommandError& error) {
+    std::fprintf(stderr, "trllocator: %s\n", error.what());
+    return error.ExitCode();
+  }
+  std::printf("%s", app.help().c_str());
+  return kExitOk;
 }

@@ -7,12 +7,17 @@ namespace trl {
 namespace {
 
 thread_local std::unique_ptr<Reporter> sharedReporter;
+thread_local std::function<void(const ReportedEventView&)> reportObserver;
 
 }  // namespace
 
 Reporter* SharedReporter() { return sharedReporter.get(); }
 
 void ReleaseSharedReporter() { sharedReporter.reset(); }
+
+void ObserveReports(std::function<void(const ReportedEventView&)> observer) {
+  reportObserver = std::move(observer);
+}
 
 int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
                     std::string_view component, std::string_view className,
@@ -25,6 +30,7 @@ int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
   }
   int32_t action = sharedReporter->Report(number, description, kind, component, className,
                                           procedure, flag1, flag2, source, lastValue);
+  if (reportObserver) reportObserver({number, description, kind, className, procedure});
   return forceIgnore ? kActionIgnore : action;
 }
 

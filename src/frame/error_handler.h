@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <exception>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -35,6 +36,17 @@ int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
 Reporter* SharedReporter();
 // Releases this thread's shared reporter; the next report creates a new one.
 void ReleaseSharedReporter();
+
+// What a host sees of each event this thread reports, as it is reported (the command line prints
+// warnings as they come). One observer per thread; an empty function removes it.
+struct ReportedEventView {
+  int32_t number;
+  std::string_view description;
+  int32_t kind;
+  std::string_view className;
+  std::string_view procedure;
+};
+void ObserveReports(std::function<void(const ReportedEventView&)> observer);
 
 // Reports a warning (kind 2) of `className`.`procedure` through HandleEvent and goes on.
 void ReportWarning(int32_t number, std::string_view description, std::string_view className,

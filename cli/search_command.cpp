@@ -1,0 +1,57 @@
+#include "search_command.h"
+
+#include <memory>
+#include <string>
+
+#include "command_error.h"
+#include "document_files.h"
+#include "stage_command.h"
+#include "trl/search.h"
+
+namespace trl::cli {
+namespace {
+
+struct SearchOptions {
+  std::string searchOptions;
+  std::string applicationOptions;
+  std::string fingerprint;
+  std::string results;
+  StageOptions stage;
+};
+
+int RunSearch(const SearchOptions& options) {
+  auto searchOptions = LoadDocumentFile(options.searchOptions, "search options");
+  auto applicationOptions =
+      LoadOptionalDocumentFile(options.applicationOptions, "application options");
+  auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, "fingerprint database");
+  auto results = LoadOptionalDocumentFile(options.results, "results document");
+
+  ReportPrinter printer;
+  Search search(FileSystemWithShares(options.stage.shares));
+  search.Asynchronous(false);
+  std::string text = search.Start(searchOptions, applicationOptions, fingerprint, results);
+  if (text.empty()) throw CommandError("the search produced no document", kExitFailed);
+  WriteTextOutput(text, options.stage.output);
+  return kExitOk;
+}
+
+}  // namespace
+
+std::function<int()> AddSearchCommand(CLI::App& app) {
+  auto options = std::make_shared<SearchOptions>();
+  CLI::App* command =
+      app.add_subcommand("search", "Walk the folders of the search options and record the files");
+  command->add_option("--search-options", options->searchOptions, "Search options document")
+      ->required();
+  command->add_option("--application-options", options->applicationOptions,
+                      "Application options document (which applications take part)");
+  command->add_option("--fingerprint", options->fingerprint,
+                      "Fingerprint database (for the applications the search options probe)");
+  command->add_option("--results", options->results,
+                      "A local-files document to add to (its ids are continued)");
+  AddShareOption(*command, options->stage);
+  AddOutputOption(*command, options->stage);
+  return [command, options] { return command->parsed() ? RunSearch(*options) : -1; };
+}
+
+}  // namespace trl::cli

@@ -1,0 +1,54 @@
+#include "stage_command.h"
+
+#include <fmt/format.h>
+
+#include <cstdio>
+
+#include "command_error.h"
+#include "frame/error_handler.h"
+#include "platform/failure.h"
+#include "platform/fs/posix/posix_file_system.h"
+#include "platform/fs/share_table.h"
+#include "reporter/reporter.h"
+
+namespace trl::cli {
+
+void AddShareOption(CLI::App& command, StageOptions& options) {
+  command.add_option("--share", options.shares,
+                     "Where a network share is on this machine: \\\\HOST\\SHARE=DIR (repeatable; "
+                     "network mounts of the system are used too)");
+}
+
+void AddOutputOption(CLI::App& command, StageOptions& options) {
+  command.add_option("--output,-o", options.output,
+                     "Write the result document to FILE instead of standard output");
+}
+
+std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::string>& shares) {
+  fs::ShareTable table;
+  for (const std::string& mapping : shares) {
+    try {
+      table.AddMapping(mapping);
+    } catch (const Failure&) {
+      throw CommandError(
+          fmt::format("--share '{}' is not a share mapping: write \\\\HOST\\SHARE=DIR", mapping));
+    }
+  }
+  table.AddSystemMounts();
+  return fs::CreatePosixFileSystem(std::move(table));
+}
+
+ReportPrinter::ReportPrinter() {
+  ObserveReports([](const ReportedEventView& event) {
+    if (event.kind == Reporter::kWarning) {
+      fmt::print(stderr, "trllocator: warning: {}\n", event.description);
+    } else if (event.kind == Reporter::kFailure) {
+      fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
+                 event.number, event.description);
+    }
+  });
+}
+
+ReportPrinter::~ReportPrinter() { ObserveReports(nullptr); }
+
+}  // namespace trl::cli

@@ -1,0 +1,34 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <string>
+#include <vector>
+
+#include "platform/fs/file_system.h"
+
+namespace trl::cli {
+
+// What the commands that run one stage share: network share mappings, the output file, and the
+// printing of what the stage reports.
+struct StageOptions {
+  std::vector<std::string> shares;  // "\\HOST\SHARE=DIR"
+  std::string output;
+};
+
+void AddShareOption(CLI::App& command, StageOptions& options);
+void AddOutputOption(CLI::App& command, StageOptions& options);
+
+// This machine's file system, with the given share mappings before the system's network mounts.
+// A malformed mapping is a CommandError.
+std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::string>& shares);
+
+// Prints each warning and failure the stages report to standard error while it lives.
+class ReportPrinter {
+ public:
+  ReportPrinter();
+  ~ReportPrinter();
+  ReportPrinter(const ReportPrinter&) = delete;
+  ReportPrinter& operator=(const ReportPrinter&) = delete;
+};
+
+}  // namespace trl::cli

@@ -1,0 +1,240 @@
+#include "trl/search.h"
+
+#include <algorithm>
+#include <optional>
+
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/fixes.h"
+#include "frame/general.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "platform/clock.h"
+#include "platform/convert.h"
+#include "platform/fs/posix/posix_file_system.h"
+#include "platform/regexp.h"
+#include "schema/schema.h"
+#include "search/search_names.h"
+
+namespace trl {
+
+using search::kClass;
+using search::kRunLabel;
+
+namespace {
+
+constexpr int32_t kSearchMode = 1;
+
+// The highest id of the elements with this tag anywhere in the document: the number in each one's
+// first attribute, 0 when there is none. Ids that are not whole numbers cannot clash with the
+// ones the run adds and are passed over.
+int32_t HighestId(xml::Node root, std::string_view tag) {
+  int32_t highest = 0;
+  for (const xml::Node& element : root.GetElementsByTagName(tag)) {
+    auto attributes = element.Attributes();
+    if (attributes.empty()) continue;
+    try {
+      highest = std::max(highest, ToInt32(attributes.front().second));
+    } catch (const Failure&) {
+    }
+  }
+  return highest;
+}
+
+}  // namespace
+
+Search::Search()
+    : Worker(kClass, kSearchMode),
+      objFSO(CreateService<fs::FileSystem>("Scripting.FileSystemObject",
+                                           [] {
+                                             fs::ShareTable shares;
+                                             shares.AddSystemMounts();
+                                             return fs::CreatePosixFileSystem(std::move(shares));
+                                           })),
+      objRegExp(CreateService<RegExp>("VBScript_RegExp_55.RegExp",
+                                      [] { return std::make_unique<RegExp>(); })),
+      objSchema(
+          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+
+Search::Search(std::unique_ptr<fs::FileSystem> fileSystem)
+    : Worker(kClass, kSearchMode),
+      objFSO(std::move(fileSystem)),
+      objRegExp(CreateService<RegExp>("VBScript_RegExp_55.RegExp",
+                                      [] { return std::make_unique<RegExp>(); })),
+      objSchema(
+          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+
+Search::~Search() = default;
+
+std::string Search::Start(xml::DocumentPtr searchOptions, xml::DocumentPtr applicationOptions,
+                          xml::DocumentPtr fingerprint, xml::DocumentPtr& objResultsDOM) {
+  return StartFrame(
+      [&] { Prepare(searchOptions, applicationOptions, fingerprint, objResultsDOM); });
+}
+
+std::string Search::Start(xml::DocumentPtr searchOptions, xml::DocumentPtr applicationOptions,
+                          xml::DocumentPtr fingerprint) {
+  xml::DocumentPtr results;
+  return Start(std::move(searchOptions), std::move(applicationOptions), std::move(fingerprint),
+               results);
+}
+
+void Search::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicationOptions,
+                     xml::DocumentPtr& fingerprint, xml::DocumentPtr& objResultsDOM) {
+  OnError on{kClass, search::kStartLabel};
+  startTime_ = FormatDateTime(Now());
+  objSearchOptionsDOM = searchOptions;
+  objApplicationOptionsDOM =
+      applicationOptions ? applicationOptions : std::make_shared<xml::Document>();
+  objFingerprintDOM = fingerprint ? fingerprint : std::make_shared<xml::Document>();
+  if (!objResultsDOM) objResultsDOM = std::make_shared<xml::Document>();
+
+  results_ = std::make_shared<xml::Document>();
+  lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
+  if (xml::Node lent = objResultsDOM->DocumentElement()) {
+    on([&] { SetCountersFrom(results_->SetDocumentElement(lent)); });
+  } else {
+    on([&] { results_->SetDocumentElement(results_->CreateElement(vocab::results_root)); });
+  }
+  on([&] { UpgradeUserData(Use(objSearchOptionsDOM)); });
+
+  lngFolderCount = 0;
+  lngFileCounter = 0;
+  read_ = Reading{};
+  on([&] { Use(objRegExp).Pattern(""); });
+  patternUsable_ = true;
+  applicationsById_.reset();
+}
+
+void Search::SetCountersFrom(xml::Node root) {
+  lngComputerCounter = HighestId(root, vocab::c);
+  lngDriveCounter = HighestId(root, vocab::m);
+  lngFolderCounter = HighestId(root, vocab::d);
+}
+
+void Search::RunBody() {
+  OnError on{kClass, kRunLabel};
+  BeginRun(on);
+  if (status_ != kStatusCancelled) WalkSearchOptions();
+  Finish();
+}
+
+void Search::WalkSearchOptions() {
+  OnError on{kClass, kRunLabel};
+  xml::Node resultsRoot;
+  std::vector<xml::Node> computers;
+  on([&] { resultsRoot = results_->DocumentElement(); });
+  on([&] {
+    xml::Node root = Use(objSearchOptionsDOM).DocumentElement();
+    computers = root.SelectNodes("//" + root.NodeName() + "/c");
+  });
+  Reading& r = read_;
+  for (const xml::Node& c : computers) {
+    on([&] { r.cText = TextOf(c, vocab::c_text); });
+    on([&] { r.cName = TextOf(c, vocab::c_name); });
+    on([&] { r.local = TextOf(c, vocab::c_local) == "1"; });
+    on([&] {
+      r.computer = Use(objSchema).AddComputer(r.cText, r.cName, resultsRoot, lngComputerCounter);
+    });
+    std::vector<xml::Node> drives;
+    on([&] { drives = c.SelectNodes("./m"); });
+    for (const xml::Node& m : drives) {
+      on([&] { r.mText = TextOf(m, vocab::m_text); });
+      on([&] { r.mName = TextOf(m, vocab::m_name); });
+      on([&] { r.mType = TextOf(m, vocab::m_type); });
+      on([&] { r.drive = Use(objSchema).AddDrive(r.mText, r.mName, r.computer, lngDriveCounter); });
+      std::vector<xml::Node> entries;
+      on([&] { entries = m.SelectNodes("./d"); });
+      for (const xml::Node& d : entries) {
+        if (!WalkFolderEntry(d)) return;
+      }
+    }
+  }
+}
+
+bool Search::WalkFolderEntry(xml::Node entry) {
+  OnError on{kClass, kRunLabel};
+  Reading& r = read_;
+  on([&] {
+    std::string folder = TextOf(entry, vocab::d_text);
+    if (!folder.ends_with('\\')) folder += '\\';
+    r.folder = std::move(folder);
+  });
+  std::string walk = "0";
+  on([&] { walk = FixNulls<std::string>(entry.GetAttribute(vocab::d_search), "0"); });
+  if (walk == "1") {
+    on([&] {
+      r.recurse =
+          ToBool(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_recurse), "True"));
+    });
+    on([&] {
+      r.folderMask =
+          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_d_attributes), "33"));
+    });
+    on([&] {
+      r.fileMask =
+          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_f_attributes), "33"));
+    });
+    on([&] {
+      r.properties =
+          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_f_properties), "0"));
+    });
+    // An invalid pattern is reported here, once; AddFile then passes over every name quietly.
+    on([&] {
+      xml::Node mask = entry.SelectSingleNode(vocab::d_search_mask);
+      Use(objRegExp).Pattern(mask.Text());
+      patternUsable_ = false;
+      objRegExp->Test("");
+      patternUsable_ = true;
+    });
+    FindFiles(FullPath(r.folder), r.drive, r.folder, r.recurse, r.folderMask, r.fileMask,
+              r.properties);
+  }
+  std::vector<xml::Node> applications;
+  on([&] { applications = entry.SelectNodes("./a"); });
+  for (const xml::Node& a : applications) {
+    if (!ProbeApplication(a)) return false;
+  }
+  return true;
+}
+
+std::string Search::FullPath(const std::string& rest) const {
+  if (read_.local) return read_.mText + rest;
+  return "\\\\" + read_.cText + "\\" + read_.mText + rest;
+}
+
+void Search::Finish() {
+  OnError on{kClass, kRunLabel};
+  on([&] { AddEventsXML(Use(results_)); });
+  std::string endTime = FormatDateTime(Now());
+  xml::Node root;
+  on([&] { root = Use(results_).DocumentElement(); });
+  on([&] { root.SetAttribute(vocab::search_start, startTime_); });
+  on([&] { root.SetAttribute(vocab::search_end, endTime); });
+  on([&] {
+    xml::Node local = root.SelectSingleNode("//c[@c_local='1']");
+    xml::Node first = root.FirstChild();
+    if (local && !(local == first)) root.InsertBefore(local, first);
+  });
+  if (SettleStatus()) on([&] { root.SetAttribute(vocab::cancelled, "1"); });
+  EndRun(on);
+}
+
+std::string Search::ResultText() { return Use(results_).Xml(); }
+
+std::string Search::ResultsXml() { return results_ ? results_->Xml() : ""; }
+
+void Search::AddStatusCounters(xml::Node e) {
+  e.SetAttribute(vocab::e_d_count, std::to_string(lngFolderCount));
+  e.SetAttribute(vocab::e_f_count, std::to_string(lngFileCounter));
+}
+
+void Search::ReleaseDocuments() {
+  objSearchOptionsDOM.reset();
+  objApplicationOptionsDOM.reset();
+  objFingerprintDOM.reset();
+  results_.reset();
+  applicationsById_.reset();
+}
+
+}  // namespace trl
