@@ -21,9 +21,12 @@ std::string SystemReason(int error) { return std::strerror(error); }
 xml::DocumentPtr LoadDocumentFile(const std::string& path, std::string_view role) {
   // Opened here first, so that a missing or unreadable file gets the system's own reason.
   std::error_code ignored;
-  if (std::filesystem::is_directory(path, ignored)) errno = EISDIR;
+  if (std::filesystem::is_directory(path, ignored)) {
+    throw CommandError(
+        fmt::format("cannot read the {} '{}': {}", role, path, SystemReason(EISDIR)));
+  }
   std::ifstream probe(path, std::ios::binary);
-  if (errno == EISDIR || !probe) {
+  if (!probe) {
     throw CommandError(fmt::format("cannot read the {} '{}': {}", role, path, SystemReason(errno)));
   }
   probe.close();

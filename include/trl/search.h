@@ -50,7 +50,7 @@ class Search : public Worker {
   // What the run last read from the search options and the fingerprint. A value that cannot be
   // read keeps what the previous element gave, so these live for the whole run.
   struct Reading {
-    std::string cText, cName, mText, mName, mType, folder, aId, aName, fName, fRelpath, fFullpath;
+    std::string cText, cName, mText, mName, folder, aId, aName, fName, fRelpath, fFullpath;
     bool local = false;
     bool recurse = false;
     int16_t folderMask = 0;

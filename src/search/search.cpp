@@ -141,7 +141,6 @@ void Search::WalkSearchOptions() {
     for (const xml::Node& m : drives) {
       on([&] { r.mText = TextOf(m, vocab::m_text); });
       on([&] { r.mName = TextOf(m, vocab::m_name); });
-      on([&] { r.mType = TextOf(m, vocab::m_type); });
       on([&] { r.drive = Use(objSchema).AddDrive(r.mText, r.mName, r.computer, lngDriveCounter); });
       std::vector<xml::Node> entries;
       on([&] { entries = m.SelectNodes("./d"); });
