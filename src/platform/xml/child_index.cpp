@@ -22,19 +22,18 @@ pugi::xml_node ChildIndex::Find(pugi::xml_node parent, std::string_view tag, std
                                 std::string_view value) {
   auto& indexes = byParent_[parent.internal_object()];
   auto it = std::find_if(indexes.begin(), indexes.end(), [&](const KeyIndex& index) {
-    return index.tag == tag && index.attr == attr;
+    return index.tag == tag && index.first.Attr() == attr;
   });
   if (it == indexes.end()) it = indexes.insert(it, Build(parent, tag, attr));
-  auto found = it->first.find(value);
-  return found == it->first.end() ? pugi::xml_node() : pugi::xml_node(found->second);
+  return pugi::xml_node(it->first.Find(value));
 }
 
 ChildIndex::KeyIndex ChildIndex::Build(pugi::xml_node parent, std::string_view tag,
                                        std::string_view attr) {
-  KeyIndex index{std::string(tag), std::string(attr), {}, false};
+  KeyIndex index{std::string(tag), KeyTable(std::string(attr)), false};
   for (pugi::xml_node child : parent.children()) {
-    auto key = KeyOf(child, index.tag, index.attr);
-    if (key && !index.first.try_emplace(*key, child.internal_object()).second) {
+    auto key = KeyOf(child, index.tag, index.first.Attr());
+    if (key && !index.first.Insert(*key, child.internal_object())) {
       index.hasDuplicates = true;
     }
   }
@@ -42,8 +41,8 @@ ChildIndex::KeyIndex ChildIndex::Build(pugi::xml_node parent, std::string_view t
 }
 
 bool ChildIndex::Insert(KeyIndex& index, pugi::xml_node child) {
-  auto key = KeyOf(child, index.tag, index.attr);
-  if (!key || index.first.try_emplace(*key, child.internal_object()).second) return true;
+  auto key = KeyOf(child, index.tag, index.first.Attr());
+  if (!key || index.first.Insert(*key, child.internal_object())) return true;
   // Another child holds the key already; it surely comes first only when this one is the last.
   if (child.next_sibling()) return false;
   index.hasDuplicates = true;
@@ -51,14 +50,12 @@ bool ChildIndex::Insert(KeyIndex& index, pugi::xml_node child) {
 }
 
 bool ChildIndex::Erase(KeyIndex& index, pugi::xml_node child) {
-  auto key = KeyOf(child, index.tag, index.attr);
+  auto key = KeyOf(child, index.tag, index.first.Attr());
   if (!key) return true;
-  auto found = index.first.find(*key);
   // A later holder of a key leaves the answers as they are.
-  if (found == index.first.end() || found->second != child.internal_object()) return true;
+  if (index.first.Find(*key) != child.internal_object()) return true;
   if (index.hasDuplicates) return false;
-  index.first.erase(found);
-  return true;
+  return index.first.Erase(*key, child.internal_object());
 }
 
 template <typename Change>
@@ -80,12 +77,12 @@ void ChildIndex::ChildLeaving(pugi::xml_node parent, pugi::xml_node child) {
 
 void ChildIndex::KeyChanging(pugi::xml_node child, std::string_view attr) {
   Update(child.parent(),
-         [&](KeyIndex& index) { return index.attr != attr || Erase(index, child); });
+         [&](KeyIndex& index) { return index.first.Attr() != attr || Erase(index, child); });
 }
 
 void ChildIndex::KeyChanged(pugi::xml_node child, std::string_view attr) {
   Update(child.parent(),
-         [&](KeyIndex& index) { return index.attr != attr || Insert(index, child); });
+         [&](KeyIndex& index) { return index.first.Attr() != attr || Insert(index, child); });
 }
 
 void ChildIndex::SubtreeDestroying(pugi::xml_node root) {

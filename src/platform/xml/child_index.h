@@ -6,6 +6,8 @@
 #include <unordered_map>
 #include <vector>
 
+#include "platform/xml/key_table.h"
+
 namespace trl::xml {
 
 // Finds the first `tag` child of a parent whose attribute `attr` holds a given value, through an
@@ -34,10 +36,9 @@ class ChildIndex {
  private:
   struct KeyIndex {
     std::string tag;
-    std::string attr;
-    // Key -> the first child holding it. The keys view the children's attribute values in place;
+    // Key -> the first child holding it. The keys are the children's attribute values in place;
     // every rewrite of such a value goes through KeyChanging first, which removes the key.
-    std::unordered_map<std::string_view, pugi::xml_node_struct*> first;
+    KeyTable first;
     // Set once a child arrived behind another with the same key: erasing a key may then uncover
     // a later holder that only a scan finds.
     bool hasDuplicates = false;

@@ -7,6 +7,13 @@
 namespace trl::xml {
 namespace {
 
+class SizeCounter : public pugi::xml_writer {
+ public:
+  void write(const void* /*data*/, size_t size) override { total += size; }
+
+  size_t total = 0;
+};
+
 class StringWriter : public pugi::xml_writer {
  public:
   void write(const void* data, size_t size) override {
@@ -15,6 +22,17 @@ class StringWriter : public pugi::xml_writer {
 
   std::string text;
 };
+
+// Prints `node` (a whole document without the detached elements' holder) to `out`.
+void Print(pugi::xml_node node, pugi::xml_node holder, pugi::xml_writer& out) {
+  if (node.type() != pugi::node_document) {
+    node.print(out, "", pugi::format_raw, pugi::encoding_utf8);
+    return;
+  }
+  for (pugi::xml_node child : node.children()) {
+    if (child != holder) child.print(out, "", pugi::format_raw, pugi::encoding_utf8);
+  }
+}
 
 pugi::xml_node RequireElement(const Node& node) {
   pugi::xml_node element = Require(node);
@@ -97,9 +115,11 @@ void Node::SetAttribute(std::string_view name, std::string_view value) {
   Document::Impl& impl = *document_->impl_;
   std::string attrName(name);
   pugi::xml_attribute attr = node.attribute(attrName.c_str());
+  // A detached element is in no index yet: it joins its parent's when it is placed.
+  bool indexed = node.parent() != impl.holder;
   bool written = false;
   if (attr) {
-    impl.index.KeyChanging(node, attrName);
+    if (indexed) impl.index.KeyChanging(node, attrName);
     written = attr.set_value(value.data(), value.size());
   } else {
     attr = node.append_attribute(attrName.c_str());
@@ -107,7 +127,7 @@ void Node::SetAttribute(std::string_view name, std::string_view value) {
     if (attr && !written) node.remove_attribute(attr);
   }
   // Also after a failed write, which leaves the old value (or no attribute) in place.
-  impl.index.KeyChanged(node, attrName);
+  if (indexed) impl.index.KeyChanged(node, attrName);
   if (!written) FailOutOfMemory();
   impl.Changed();
 }
@@ -240,15 +260,13 @@ void Node::SetText(std::string_view text) {
 
 std::string Node::Xml() const {
   pugi::xml_node node = Require(*this);
+  pugi::xml_node holder = document_->impl_->holder;
+  // Sized first: a large document's text then takes its own size, not up to twice that.
+  SizeCounter size;
+  Print(node, holder, size);
   StringWriter out;
-  if (node.type() == pugi::node_document) {
-    pugi::xml_node holder = document_->impl_->holder;
-    for (pugi::xml_node child : node.children()) {
-      if (child != holder) child.print(out, "", pugi::format_raw, pugi::encoding_utf8);
-    }
-  } else {
-    node.print(out, "", pugi::format_raw, pugi::encoding_utf8);
-  }
+  out.text.reserve(size.total);
+  Print(node, holder, out);
   return std::move(out.text);
 }
 
