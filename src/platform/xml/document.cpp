@@ -51,6 +51,9 @@ Document::Impl::Impl(Document& owner) : owner(owner), serial(++lastSerial) {}
 void Document::Impl::Reset(ParseError error) {
   index.Clear();
   holder = pugi::xml_node();
+  pool = pugi::xml_node();
+  tagPrototypes.clear();
+  attributePrototypes.clear();
   doc.reset();
   parseError = std::move(error);
   Changed();
@@ -72,6 +75,36 @@ pugi::xml_node Document::Impl::Holder() {
     if (!holder) FailOutOfMemory();
   }
   return holder;
+}
+
+pugi::xml_node Document::Impl::NamePool() {
+  if (!pool) {
+    pool = Holder().prepend_child(pugi::node_element);
+    if (!pool) FailOutOfMemory();
+  }
+  return pool;
+}
+
+pugi::xml_node Document::Impl::Prototype(std::string_view name, bool attribute) {
+  auto& prototypes = attribute ? attributePrototypes : tagPrototypes;
+  std::string key(name);
+  auto found = prototypes.find(key);
+  if (found != prototypes.end()) return found->second;
+  // `name` is a checked XML name, so the text parses; the element is the last one appended.
+  std::string text = attribute ? "<n " + key + "=\"\"/>" : "<" + key + "/>";
+  pugi::xml_node pool = NamePool();
+  if (!pool.append_buffer(text.data(), text.size(), pugi::parse_minimal)) FailOutOfMemory();
+  return prototypes.emplace(std::move(key), pool.last_child()).first->second;
+}
+
+pugi::xml_node Document::Impl::NewElement(std::string_view tag) {
+  pugi::xml_node element = Holder().append_copy(Prototype(tag, false));
+  if (!element) FailOutOfMemory();
+  return element;
+}
+
+pugi::xml_attribute Document::Impl::NewAttribute(pugi::xml_node element, std::string_view name) {
+  return element.append_copy(Prototype(name, true).first_attribute());
 }
 
 pugi::xml_node Document::Impl::FragmentOf(pugi::xml_node node) const {
@@ -188,9 +221,7 @@ Node Document::SetDocumentElement(Node element) {
 
 Node Document::CreateElement(std::string_view tag) {
   CheckName(tag);
-  pugi::xml_node element = impl_->Holder().append_child(std::string(tag).c_str());
-  if (!element) FailOutOfMemory();
-  return impl_->Wrap(element);
+  return impl_->Wrap(impl_->NewElement(tag));
 }
 
 Node Document::FindChild(Node parent, std::string_view tag, std::string_view attr,

@@ -2,7 +2,9 @@
 
 #include <cstdint>
 #include <pugixml.hpp>
+#include <string>
 #include <string_view>
+#include <unordered_map>
 
 #include "platform/xml/child_index.h"
 #include "trl/xml.h"
@@ -42,8 +44,15 @@ struct Document::Impl {
 
   // The holder, created when missing.
   pugi::xml_node Holder();
-  // Whether some node is detached, so that selections have to be filtered by fragment.
+  // Whether some node is detached (or the name pool exists), so that selections have to be
+  // filtered by fragment.
   bool HasDetached() const { return holder && holder.first_child(); }
+
+  // A new element named `tag` under the holder, and a new attribute `name` of `element`, whose
+  // names are shared with the name pool instead of copied: millions of elements of a few kinds
+  // then carry no copy of their names.
+  pugi::xml_node NewElement(std::string_view tag);
+  pugi::xml_attribute NewAttribute(pugi::xml_node element, std::string_view name);
   // The top of the fragment `node` belongs to: the document node for a node of the tree, the
   // topmost detached ancestor otherwise (the holder itself for the holder).
   pugi::xml_node FragmentOf(pugi::xml_node node) const;
@@ -66,6 +75,15 @@ struct Document::Impl {
   ChildIndex index;
 
  private:
+  // The name pool: the holder's first child, unnamed, so no selection can name it. It holds one
+  // parsed element per tag and per attribute name; parsed names stay in pugixml's parse buffer,
+  // and copies of a parsed node point to that buffer instead of copying the text.
+  pugi::xml_node NamePool();
+  pugi::xml_node Prototype(std::string_view name, bool attribute);
+  pugi::xml_node pool;
+  std::unordered_map<std::string, pugi::xml_node> tagPrototypes;
+  std::unordered_map<std::string, pugi::xml_node> attributePrototypes;
+
   void CheckPlacement(pugi::xml_node parent, pugi::xml_node child, pugi::xml_node replacing) const;
 };
 

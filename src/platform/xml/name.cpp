@@ -33,10 +33,22 @@ bool InRanges(const Range (&ranges)[N], char32_t c) {
   return it != std::end(ranges) && it->first <= c;
 }
 
+bool IsAsciiNameChar(unsigned char c, bool first) {
+  bool start = c == ':' || c == '_' || (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z');
+  return start || (!first && (c == '-' || c == '.' || (c >= '0' && c <= '9')));
+}
+
 }  // namespace
 
 bool IsXmlName(std::string_view name) {
   if (name.empty()) return false;
+  // Names are nearly always ASCII: checked without decoding, unless a byte says otherwise.
+  size_t ascii = 0;
+  while (ascii < name.size() && static_cast<unsigned char>(name[ascii]) < 0x80) {
+    if (!IsAsciiNameChar(static_cast<unsigned char>(name[ascii]), ascii == 0)) return false;
+    ++ascii;
+  }
+  if (ascii == name.size()) return true;
   auto bytes = reinterpret_cast<const utf8proc_uint8_t*>(name.data());
   auto left = static_cast<utf8proc_ssize_t>(name.size());
   bool first = true;

@@ -122,7 +122,7 @@ void Node::SetAttribute(std::string_view name, std::string_view value) {
     if (indexed) impl.index.KeyChanging(node, attrName);
     written = attr.set_value(value.data(), value.size());
   } else {
-    attr = node.append_attribute(attrName.c_str());
+    attr = impl.NewAttribute(node, attrName);
     written = attr && attr.set_value(value.data(), value.size());
     if (attr && !written) node.remove_attribute(attr);
   }
