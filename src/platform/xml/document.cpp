@@ -39,7 +39,7 @@ void CheckName(std::string_view name) {
 }
 
 void CheckText(std::string_view text) {
-  if (!IsValidUtf8(text) || !IsXmlSafe(text)) {
+  if (!IsXmlSafe(text)) {  // which also refuses what is not UTF-8
     Fail(kInvalidArgument, "The text is not UTF-8 that an XML document can carry");
   }
 }
@@ -87,9 +87,10 @@ pugi::xml_node Document::Impl::NamePool() {
 
 pugi::xml_node Document::Impl::Prototype(std::string_view name, bool attribute) {
   auto& prototypes = attribute ? attributePrototypes : tagPrototypes;
-  std::string key(name);
-  auto found = prototypes.find(key);
+  auto found = prototypes.find(name);
   if (found != prototypes.end()) return found->second;
+  CheckName(name);
+  std::string key(name);
   // `name` is a checked XML name, so the text parses; the element is the last one appended.
   std::string text = attribute ? "<n " + key + "=\"\"/>" : "<" + key + "/>";
   pugi::xml_node pool = NamePool();
@@ -150,7 +151,8 @@ pugi::xml_node Document::Impl::Place(pugi::xml_node parent, const Node& child,
     // Checked above but for one case, which pugixml refuses before it changes anything.
     placed = before ? parent.insert_move_before(node, before) : parent.append_move(node);
     if (!placed) Fail(kInvalidArgument, "A node cannot be placed under itself or its descendant");
-    index.ChildLeaving(from, node);
+    // The holder never has an index: nothing outside this layer can name it.
+    if (from != holder) index.ChildLeaving(from, node);
   } else {
     placed = before ? parent.insert_copy_before(node, before) : parent.append_copy(node);
     if (!placed) FailOutOfMemory();
@@ -219,10 +221,7 @@ Node Document::SetDocumentElement(Node element) {
   return impl_->Wrap(impl_->Place(impl_->doc, element, current, current));
 }
 
-Node Document::CreateElement(std::string_view tag) {
-  CheckName(tag);
-  return impl_->Wrap(impl_->NewElement(tag));
-}
+Node Document::CreateElement(std::string_view tag) { return impl_->Wrap(impl_->NewElement(tag)); }
 
 Node Document::FindChild(Node parent, std::string_view tag, std::string_view attr,
                          std::string_view value) {

@@ -81,8 +81,14 @@ struct Document::Impl {
   pugi::xml_node NamePool();
   pugi::xml_node Prototype(std::string_view name, bool attribute);
   pugi::xml_node pool;
-  std::unordered_map<std::string, pugi::xml_node> tagPrototypes;
-  std::unordered_map<std::string, pugi::xml_node> attributePrototypes;
+  // Looked up by string_view, without making a string.
+  struct NameHash {
+    using is_transparent = void;
+    size_t operator()(std::string_view name) const { return std::hash<std::string_view>{}(name); }
+  };
+  using Prototypes = std::unordered_map<std::string, pugi::xml_node, NameHash, std::equal_to<>>;
+  Prototypes tagPrototypes;
+  Prototypes attributePrototypes;
 
   void CheckPlacement(pugi::xml_node parent, pugi::xml_node child, pugi::xml_node replacing) const;
 };

@@ -110,24 +110,23 @@ std::optional<std::string> Node::GetAttribute(std::string_view name) const {
 
 void Node::SetAttribute(std::string_view name, std::string_view value) {
   pugi::xml_node node = RequireElement(*this);
-  CheckName(name);
   CheckText(value);
   Document::Impl& impl = *document_->impl_;
-  std::string attrName(name);
-  pugi::xml_attribute attr = node.attribute(attrName.c_str());
+  pugi::xml_attribute attr = node.first_attribute();
+  while (attr && name != attr.name()) attr = attr.next_attribute();
   // A detached element is in no index yet: it joins its parent's when it is placed.
   bool indexed = node.parent() != impl.holder;
   bool written = false;
   if (attr) {
-    if (indexed) impl.index.KeyChanging(node, attrName);
+    if (indexed) impl.index.KeyChanging(node, name);
     written = attr.set_value(value.data(), value.size());
   } else {
-    attr = impl.NewAttribute(node, attrName);
+    attr = impl.NewAttribute(node, name);  // checks the name
     written = attr && attr.set_value(value.data(), value.size());
     if (attr && !written) node.remove_attribute(attr);
   }
   // Also after a failed write, which leaves the old value (or no attribute) in place.
-  if (indexed) impl.index.KeyChanged(node, attrName);
+  if (indexed) impl.index.KeyChanged(node, name);
   if (!written) FailOutOfMemory();
   impl.Changed();
 }
