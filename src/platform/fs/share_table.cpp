@@ -1,11 +1,10 @@
 #include "platform/fs/share_table.h"
 
 #include <algorithm>
-#include <fstream>
-#include <sstream>
 
 #include "platform/failure.h"
 #include "platform/fs/component_path.h"
+#include "platform/fs/mount_table.h"
 #include "platform/text.h"
 
 // Directories are kept in the component's encoding, like the rest of a path, so that Resolve gives
@@ -19,25 +18,6 @@ std::vector<std::string> LowerComponents(std::string_view text) {
   auto components = SplitComponents(text);
   for (auto& component : components) component = LowerCase(component);
   return components;
-}
-
-bool IsOctalDigit(char c) { return c >= '0' && c <= '7'; }
-
-// Undoes the octal escapes (\040 for a blank, \011, \012, \134) of a mount table field.
-std::string UnescapeMountField(std::string_view field) {
-  std::string out;
-  out.reserve(field.size());
-  for (size_t i = 0; i < field.size(); ++i) {
-    if (field[i] == '\\' && i + 3 < field.size() && IsOctalDigit(field[i + 1]) &&
-        IsOctalDigit(field[i + 2]) && IsOctalDigit(field[i + 3])) {
-      out += static_cast<char>((field[i + 1] - '0') * 64 + (field[i + 2] - '0') * 8 +
-                               (field[i + 3] - '0'));
-      i += 3;
-    } else {
-      out += field[i];
-    }
-  }
-  return out;
 }
 
 }  // namespace
@@ -60,18 +40,13 @@ void ShareTable::AddMapping(std::string_view mapping) {
   Add(components[0], share, std::string(mapping.substr(equals + 1)));
 }
 
-void ShareTable::AddMounts(std::string_view mountTable) {
-  std::istringstream lines{std::string(mountTable)};
-  std::string line;
-  while (std::getline(lines, line)) {
-    std::istringstream fields(line);
-    std::string device;
-    std::string directory;
-    std::string type;
-    if (!(fields >> device >> directory >> type)) continue;
-    device = UnescapeMountField(device);
-    directory = NameFromNative(UnescapeMountField(directory));
-    if (type == "cifs" || type == "smb3") {
+void ShareTable::AddMounts(std::string_view mountTable) { AddMounts(ParseMountTable(mountTable)); }
+
+void ShareTable::AddMounts(const std::vector<Mount>& mounts) {
+  for (const Mount& mount : mounts) {
+    const std::string& device = mount.device;
+    std::string directory = NameFromNative(mount.directory);
+    if (mount.type == "cifs" || mount.type == "smb3") {
       // "//host/share[/more]"
       if (device.size() < 3 || !IsSeparator(device[0]) || !IsSeparator(device[1])) continue;
       auto components = LowerComponents(device);
@@ -79,7 +54,7 @@ void ShareTable::AddMounts(std::string_view mountTable) {
       std::string host = components.front();
       components.erase(components.begin());
       entries_.push_back({std::move(host), std::move(components), directory, false});
-    } else if (type == "nfs" || type == "nfs4") {
+    } else if (mount.type == "nfs" || mount.type == "nfs4") {
       // "host:/export/path" answers to the share "export\path" and to "path".
       auto colon = device.find(":/");
       if (colon == 0 || colon == std::string::npos) continue;
@@ -92,11 +67,7 @@ void ShareTable::AddMounts(std::string_view mountTable) {
 }
 
 void ShareTable::AddSystemMounts() {
-  std::ifstream file("/proc/self/mounts");
-  if (!file) return;
-  std::ostringstream text;
-  text << file.rdbuf();
-  AddMounts(text.str());
+  if (auto mounts = SystemMounts()) AddMounts(*mounts);
 }
 
 std::optional<std::string> ShareTable::Resolve(std::string_view uncPath) const {

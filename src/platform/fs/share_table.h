@@ -7,6 +7,8 @@
 
 namespace trl::fs {
 
+struct Mount;
+
 // Where network paths "\\host\share\rest" lead on this machine: mappings the caller gives first,
 // then the network mounts (cifs, smb3, nfs, nfs4) of the system's mount table. Host and share names
 // compare regardless of case; the longest share path that fits wins.
@@ -18,6 +20,7 @@ class ShareTable {
   void AddMapping(std::string_view mapping);
   // Adds the network mounts of a mount table in the format of /proc/self/mounts.
   void AddMounts(std::string_view mountTable);
+  void AddMounts(const std::vector<Mount>& mounts);
   void AddSystemMounts();  // reads /proc/self/mounts; no failure when it cannot be read
 
   // The local directory and remaining components for a "\\host\share\rest" path ("/" separators,
@@ -26,8 +29,8 @@ class ShareTable {
 
  private:
   struct Entry {
-    std::string host;                 // lower-cased
-    std::vector<std::string> share;   // lower-cased components
+    std::string host;                // lower-cased
+    std::vector<std::string> share;  // lower-cased components
     std::string directory;
     bool given;
   };

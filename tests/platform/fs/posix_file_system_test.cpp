@@ -16,6 +16,7 @@
 #include "platform/failure.h"
 #include "platform/fs/dos_attributes.h"
 #include "platform/fs/posix/sys_calls.h"
+#include "platform/fs/posix/walk_memory.h"
 #include "platform/text.h"
 #include "support/failure_of.h"
 #include "support/fault_injecting_file_system.h"
@@ -289,6 +290,7 @@ TEST_F(PosixFileSystemTest, AttributesComputeOnlyTheWantedBits) {
 TEST_F(PosixFileSystemTest, ListedItemsCostAStatOnlyForModeSizeOrTime) {
   for (const char* name : {"a", "b", "c"}) tree_.AddFolder(name);
   for (int i = 0; i < 4; ++i) tree_.AddFile("f" + std::to_string(i), std::string(i, 'x'));
+  tree_.AddFile("a/in_a");
   auto folder = fs_->GetFolder(tree_.Path());
   const auto& files = folder->Files();
   auto listed = posix::CountedSysCalls();
@@ -305,15 +307,41 @@ TEST_F(PosixFileSystemTest, ListedItemsCostAStatOnlyForModeSizeOrTime) {
   EXPECT_EQ(totalSize, 0u + 1 + 2 + 3);
   EXPECT_EQ(posix::CountedSysCalls().stat - cheap.stat, files.size());
 
-  // What a walker asks about each subfolder it lists costs one stat.
+  // What a walker asks about each subfolder it listed, the listing answers: no stat, and the
+  // attributes of the subfolder's files need no statfs of their own.
   for (const auto& sub : folder->SubFolders()) {
     std::string path = sub->Path() + "\\";
-    auto before = posix::CountedSysCalls().stat;
+    auto before = posix::CountedSysCalls();
     EXPECT_FALSE(fs_->FileExists(path));
     EXPECT_TRUE(fs_->FolderExists(path));
-    EXPECT_EQ(fs_->GetFolder(path)->Path(), sub->Path());
-    EXPECT_EQ(posix::CountedSysCalls().stat - before, 1u);
+    auto walked = fs_->GetFolder(path);
+    EXPECT_EQ(walked->Path(), sub->Path());
+    for (const auto& file : walked->Files()) EXPECT_EQ(file->Attributes(kHidden), 0);
+    EXPECT_EQ(posix::CountedSysCalls().stat, before.stat);
+    EXPECT_EQ(posix::CountedSysCalls().statfs, before.statfs);
   }
+}
+
+// A listed subfolder asks its parent where its attributes come from, unless it is a mount point:
+// another file system may lie behind it.
+TEST(WalkMemoryTest, OnlyMountPointsDecideTheirAttributeSourceThemselves) {
+  testing::TempTree tree;
+  tree.AddFolder("plain");
+  tree.AddFolder("mounted");
+  auto parent = std::make_shared<posix::FolderPlace>(tree.Root(), tree.Path());
+  auto plain = std::make_shared<posix::FolderPlace>(tree.Native("plain"), tree.Path("plain"));
+  auto mounted = std::make_shared<posix::FolderPlace>(tree.Native("mounted"), tree.Path("mounted"));
+  posix::WalkMemory memory({tree.Native("mounted")});
+  memory.Listed(parent, plain);
+  memory.Listed(parent, mounted);
+  parent->HasDosAttributes();
+  auto before = posix::CountedSysCalls().statfs;
+  plain->HasDosAttributes();
+  EXPECT_EQ(posix::CountedSysCalls().statfs, before);
+  mounted->HasDosAttributes();
+  EXPECT_EQ(posix::CountedSysCalls().statfs, before + 1);
+  ASSERT_TRUE(memory.Take(tree.Path("plain") + "\\"));
+  EXPECT_FALSE(memory.Take(tree.Path("plain") + "\\")) << "handed out once";
 }
 
 TEST(DosAttributesTest, DecodesTheLittleEndianWordKeepingFourBits) {

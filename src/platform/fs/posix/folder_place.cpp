@@ -14,6 +14,7 @@ std::string FolderPlace::PathChild(std::string_view nativeName) const {
 }
 
 bool FolderPlace::HasDosAttributes() const {
+  if (!dosAttributes_ && dosParent_) dosAttributes_ = dosParent_->HasDosAttributes();
   if (!dosAttributes_) {
     int64_t type = 0;
     dosAttributes_ = FileSystemType(native_, type) == 0 && IsSmbFileSystemType(type);

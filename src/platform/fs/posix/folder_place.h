@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <ctime>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -26,11 +27,16 @@ class FolderPlace {
   std::string NativeChild(std::string_view nativeName) const;
   std::string PathChild(std::string_view nativeName) const;
   bool HasDosAttributes() const;
+  // Answers HasDosAttributes as `parent` does: for a folder on the same file system.
+  void ShareDosSourceOf(std::shared_ptr<const FolderPlace> parent) {
+    dosParent_ = std::move(parent);
+  }
 
  private:
   std::string native_;  // "/opt/Acme"
   std::string path_;    // "\opt\Acme"
   mutable std::optional<bool> dosAttributes_;
+  std::shared_ptr<const FolderPlace> dosParent_;
 };
 
 // The part of a stat an item keeps.

@@ -12,6 +12,7 @@
 #include "platform/fs/posix/posix_file.h"
 #include "platform/fs/posix/posix_folder.h"
 #include "platform/fs/posix/sys_calls.h"
+#include "platform/fs/posix/walk_memory.h"
 #include "platform/text.h"
 
 namespace trl::fs::posix {
@@ -19,12 +20,14 @@ namespace {
 
 // What a path names, once found.
 struct Item {
+  std::shared_ptr<FolderPlace> place;  // for a folder a listing found: where it is
   std::string native;
   std::string path;        // component form, the last name spelt as the file system spells it
   std::string nativeName;  // "" for a root
   bool shareRoot = false;
-  bool mustBeFolder = false;  // the path ended with a separator
-  ItemStatus status;
+  bool mustBeFolder = false;         // the path ended with a separator
+  std::optional<ItemStatus> status;  // none for a folder a listing found
+  bool IsFolder() const { return place || S_ISDIR(status->mode); }
 };
 
 std::string ParentOf(const std::string& path, char separator) {
@@ -36,27 +39,28 @@ std::string ParentOf(const std::string& path, char separator) {
 // Not safe for use by several threads at once: a run owns one.
 class PosixFileSystem final : public FileSystem {
  public:
-  explicit PosixFileSystem(ShareTable shares) : shares_(std::move(shares)) {}
+  explicit PosixFileSystem(ShareTable shares)
+      : shares_(std::move(shares)), memory_(std::make_shared<WalkMemory>()) {}
 
   bool FileExists(std::string_view path) override {
     Item item;
-    return Find(path, item) == 0 && !S_ISDIR(item.status.mode) && !item.mustBeFolder;
+    return Find(path, item) == 0 && !item.IsFolder() && !item.mustBeFolder;
   }
 
   bool FolderExists(std::string_view path) override {
     Item item;
-    return Find(path, item) == 0 && S_ISDIR(item.status.mode);
+    return Find(path, item) == 0 && item.IsFolder();
   }
 
   std::unique_ptr<File> GetFile(std::string_view path) override {
     Item item;
     if (int error = Find(path, item)) Fail(LookupFailure(error, kFileNotFound));
-    if (S_ISDIR(item.status.mode) || item.mustBeFolder) Fail(kFileNotFound);
+    if (item.IsFolder() || item.mustBeFolder) Fail(kFileNotFound);
     auto folder =
         std::make_shared<FolderPlace>(ParentOf(item.native, '/'), ParentOf(item.path, '\\'));
     // Following the link, a regular file is not a system file whether or not it was reached
     // through a link; anything else needs an lstat to decide.
-    unsigned char type = S_ISREG(item.status.mode) ? DT_REG : DT_UNKNOWN;
+    unsigned char type = S_ISREG(item.status->mode) ? DT_REG : DT_UNKNOWN;
     return std::make_unique<PosixFile>(std::move(folder), std::move(item.nativeName), type,
                                        item.status);
   }
@@ -64,10 +68,12 @@ class PosixFileSystem final : public FileSystem {
   std::unique_ptr<Folder> GetFolder(std::string_view path) override {
     Item item;
     if (int error = Find(path, item)) Fail(LookupFailure(error, kPathNotFound));
-    if (!S_ISDIR(item.status.mode)) Fail(kPathNotFound);
-    auto place = std::make_shared<FolderPlace>(std::move(item.native), std::move(item.path));
+    if (!item.IsFolder()) Fail(kPathNotFound);
+    auto place = item.place
+                     ? item.place
+                     : std::make_shared<FolderPlace>(std::move(item.native), std::move(item.path));
     return std::make_unique<PosixFolder>(std::move(place), std::move(item.nativeName),
-                                         item.shareRoot, item.status);
+                                         item.shareRoot, item.status, memory_);
   }
 
  private:
@@ -79,6 +85,13 @@ class PosixFileSystem final : public FileSystem {
       return 0;
     }
     last_.reset();
+    if (auto listed = memory_->Take(text)) {
+      item.place = std::move(listed->place);
+      item.nativeName = std::move(listed->nativeName);
+      item.mustBeFolder = true;
+      Remember(text, item);
+      return 0;
+    }
     auto path = ParseComponentPath(text);
     std::string native;
     struct stat status {};
@@ -101,11 +114,13 @@ class PosixFileSystem final : public FileSystem {
     item.path = path.Text();
     item.mustBeFolder = path.trailingSeparator;
     item.status = ToItemStatus(status);
-    if (S_ISDIR(status.st_mode)) {
-      lastText_ = text;
-      last_ = item;
-    }
+    if (S_ISDIR(status.st_mode)) Remember(text, item);
     return 0;
+  }
+
+  void Remember(std::string_view text, const Item& item) {
+    lastText_ = text;
+    last_ = item;
   }
 
   // Finds the native item `path` names: through the share table for a network path, with one
@@ -134,6 +149,7 @@ class PosixFileSystem final : public FileSystem {
 
   ShareTable shares_;
   NameResolver resolver_;
+  std::shared_ptr<WalkMemory> memory_;
   // A walker asks about each subfolder it has listed three times running, with one text:
   // FileExists, FolderExists and GetFolder of the subfolder's Path and "\". The last folder found
   // is remembered with its text, so the three cost one stat; any other lookup drops it, and files

@@ -79,7 +79,9 @@ void PosixFolder::List() {
     if (type == DT_DIR) {
       auto place =
           std::make_shared<FolderPlace>(place_->NativeChild(name), place_->PathChild(name));
-      subFolders.push_back(std::make_unique<PosixFolder>(std::move(place), name, false));
+      if (memory_) memory_->Listed(place_, place);
+      subFolders.push_back(
+          std::make_unique<PosixFolder>(std::move(place), name, false, std::nullopt, memory_));
     } else {
       files.push_back(std::make_unique<PosixFile>(place_, name, type, status));
     }

@@ -6,6 +6,7 @@
 
 #include "platform/fs/file_system.h"
 #include "platform/fs/posix/folder_place.h"
+#include "platform/fs/posix/walk_memory.h"
 
 namespace trl::fs::posix {
 
@@ -13,12 +14,15 @@ namespace trl::fs::posix {
 class PosixFolder final : public Folder {
  public:
   // `nativeName` is "" for a root: "/" or the folder a share leads to (`shareRoot`).
+  // `memory`, when given, learns from the listing (see WalkMemory).
   PosixFolder(std::shared_ptr<FolderPlace> place, std::string nativeName, bool shareRoot,
-              std::optional<ItemStatus> status = std::nullopt)
+              std::optional<ItemStatus> status = std::nullopt,
+              std::shared_ptr<WalkMemory> memory = nullptr)
       : place_(std::move(place)),
         nativeName_(std::move(nativeName)),
         shareRoot_(shareRoot),
-        status_(status) {}
+        status_(status),
+        memory_(std::move(memory)) {}
 
   std::string Name() const override;
   std::string Path() const override { return place_->Path(); }
@@ -35,6 +39,7 @@ class PosixFolder final : public Folder {
   std::string nativeName_;
   bool shareRoot_;
   mutable std::optional<ItemStatus> status_;
+  std::shared_ptr<WalkMemory> memory_;
   bool listed_ = false;
   Collection<File> files_;
   Collection<Folder> subFolders_;
