@@ -111,6 +111,10 @@ Schema::~Schema() = default;
 std::string Schema::EncodeName(std::string_view text) const {
   static constexpr char kHex[] = "0123456789ABCDEF";
   std::string lower = LowerCase(text);
+  if (std::none_of(lower.begin(), lower.end(),
+                   [](char c) { return NeedsPercentEscape(static_cast<unsigned char>(c)); })) {
+    return lower;  // the common case, without a second copy
+  }
   std::string encoded;
   encoded.reserve(lower.size());
   for (char c : lower) {
