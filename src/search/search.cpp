@@ -159,25 +159,17 @@ bool Search::WalkFolderEntry(xml::Node entry) {
     if (!folder.ends_with('\\')) folder += '\\';
     r.folder = std::move(folder);
   });
+  // A walk-control attribute as text, its default when absent.
+  auto control = [&](std::string_view attribute, const char* fallback) {
+    return FixNulls<std::string>(entry.GetAttribute(attribute), fallback);
+  };
   std::string walk = "0";
-  on([&] { walk = FixNulls<std::string>(entry.GetAttribute(vocab::d_search), "0"); });
+  on([&] { walk = control(vocab::d_search, "0"); });
   if (walk == "1") {
-    on([&] {
-      r.recurse =
-          ToBool(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_recurse), "True"));
-    });
-    on([&] {
-      r.folderMask =
-          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_d_attributes), "33"));
-    });
-    on([&] {
-      r.fileMask =
-          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_f_attributes), "33"));
-    });
-    on([&] {
-      r.properties =
-          ToInt16(FixNulls<std::string>(entry.GetAttribute(vocab::d_search_f_properties), "0"));
-    });
+    on([&] { r.recurse = ToBool(control(vocab::d_search_recurse, "True")); });
+    on([&] { r.folderMask = ToInt16(control(vocab::d_search_d_attributes, "33")); });
+    on([&] { r.fileMask = ToInt16(control(vocab::d_search_f_attributes, "33")); });
+    on([&] { r.properties = ToInt16(control(vocab::d_search_f_properties, "0")); });
     // An invalid pattern is reported here, once; AddFile then passes over every name quietly.
     on([&] {
       xml::Node mask = entry.SelectSingleNode(vocab::d_search_mask);
