@@ -43,18 +43,13 @@ int32_t HighestId(xml::Node root, std::string_view tag) {
 
 }  // namespace
 
-Search::Search()
-    : Worker(kClass, kSearchMode),
-      objFSO(CreateService<fs::FileSystem>("Scripting.FileSystemObject",
-                                           [] {
-                                             fs::ShareTable shares;
-                                             shares.AddSystemMounts();
-                                             return fs::CreatePosixFileSystem(std::move(shares));
-                                           })),
-      objRegExp(CreateService<RegExp>("VBScript_RegExp_55.RegExp",
-                                      [] { return std::make_unique<RegExp>(); })),
-      objSchema(
-          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+Search::Search() : Search(nullptr) {
+  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject", [] {
+    fs::ShareTable shares;
+    shares.AddSystemMounts();
+    return fs::CreatePosixFileSystem(std::move(shares));
+  });
+}
 
 Search::Search(std::unique_ptr<fs::FileSystem> fileSystem)
     : Worker(kClass, kSearchMode),
