@@ -41,6 +41,8 @@ class Node {
   Node ParentNode() const;  // no object for a document or a node not in a tree
   Node FirstChild() const;
   std::vector<Node> ChildNodes() const;
+  // The child elements with this tag, in document order: "./tag" without the cost of a selection.
+  std::vector<Node> ChildElements(std::string_view tag) const;
 
   // XPath 1.0 from this node. The result is a snapshot in document order: later changes to the
   // document do not change it. A bad expression fails with kInvalidArgument (5).

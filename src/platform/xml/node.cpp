@@ -103,9 +103,11 @@ Document& Node::OwnerDocument() const {
 }
 
 std::optional<std::string> Node::GetAttribute(std::string_view name) const {
-  pugi::xml_attribute attr = Require(*this).attribute(std::string(name).c_str());
-  if (!attr) return std::nullopt;
-  return std::string(attr.value());
+  // A walk of the attributes needs no terminated copy of the name.
+  for (pugi::xml_attribute attr : Require(*this).attributes()) {
+    if (name == attr.name()) return std::string(attr.value());
+  }
+  return std::nullopt;
 }
 
 void Node::SetAttribute(std::string_view name, std::string_view value) {
@@ -168,6 +170,18 @@ std::vector<Node> Node::ChildNodes() const {
   std::vector<Node> children;
   for (pugi::xml_node child : node.children()) {
     if (child != impl.holder) children.push_back(impl.Wrap(child));
+  }
+  return children;
+}
+
+std::vector<Node> Node::ChildElements(std::string_view tag) const {
+  pugi::xml_node node = Require(*this);
+  Document::Impl& impl = *document_->impl_;
+  std::vector<Node> children;
+  for (pugi::xml_node child : node.children()) {
+    if (child.type() == pugi::node_element && child != impl.holder && tag == child.name()) {
+      children.push_back(impl.Wrap(child));
+    }
   }
   return children;
 }

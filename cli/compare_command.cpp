@@ -1,0 +1,52 @@
+#include "compare_command.h"
+
+#include <memory>
+#include <string>
+
+#include "command_error.h"
+#include "document_files.h"
+#include "stage_command.h"
+#include "trl/compare.h"
+
+namespace trl::cli {
+namespace {
+
+struct CompareOptions {
+  std::string applicationOptions;
+  std::string localFiles;
+  std::string fingerprint;
+  StageOptions stage;
+};
+
+int RunCompare(const CompareOptions& options) {
+  auto applicationOptions =
+      LoadOptionalDocumentFile(options.applicationOptions, "application options");
+  auto localFiles = LoadDocumentFile(options.localFiles, "local-files document");
+  auto fingerprint = LoadDocumentFile(options.fingerprint, "fingerprint database");
+
+  ReportPrinter printer;
+  Compare compare(FileSystemWithShares(options.stage.shares));
+  compare.Asynchronous(false);
+  std::string text = compare.Start(applicationOptions, localFiles, fingerprint);
+  if (text.empty()) throw CommandError("the compare produced no document", kExitFailed);
+  WriteTextOutput(text, options.stage.output);
+  return kExitOk;
+}
+
+}  // namespace
+
+std::function<int()> AddCompareCommand(CLI::App& app) {
+  auto options = std::make_shared<CompareOptions>();
+  CLI::App* command = app.add_subcommand(
+      "compare", "Match the fingerprints against the local files a search recorded");
+  command->add_option("--application-options", options->applicationOptions,
+                      "Application options document (which applications take part)");
+  command->add_option("--local-files", options->localFiles, "Local-files document of a search")
+      ->required();
+  command->add_option("--fingerprint", options->fingerprint, "Fingerprint database")->required();
+  AddShareOption(*command, options->stage);
+  AddOutputOption(*command, options->stage);
+  return [command, options] { return command->parsed() ? RunCompare(*options) : -1; };
+}
+
+}  // namespace trl::cli

@@ -1,0 +1,106 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <unordered_map>
+#include <unordered_set>
+#include <vector>
+
+#include "trl/worker.h"
+#include "trl/xml.h"
+
+namespace trl {
+
+class LocalFileIndex;
+class LocalFileRecord;
+class Schema;
+namespace fs {
+class FileSystem;
+}  // namespace fs
+
+// The second stage of a locate run: matches the fingerprint database against the local files a
+// search recorded. Every application version of which a file was found is filed, with its scores,
+// under the computer, drive and application folder where it was found; versions that lack a file
+// that carries weight are taken back out.
+class Compare : public Worker {
+ public:
+  // Works on this machine's file system, with network paths through the system's network mounts.
+  Compare();
+  // Works on `fileSystem` (for other share mappings, or a test's file system).
+  explicit Compare(std::unique_ptr<fs::FileSystem> fileSystem);
+  ~Compare() override;
+
+  // Runs the match. A null document stands for an empty one. The fingerprint gets its bit values
+  // written in place. Returns the matches' text when synchronous, "" otherwise.
+  std::string Start(xml::DocumentPtr objApplicationOptionsDOM, xml::DocumentPtr objLocalFilesDOM,
+                    xml::DocumentPtr objFingerprintDOM);
+
+  // The folder in which the application would be installed if a local file in `folder` (lower
+  // case, as the local-file index holds it) were the fingerprint file `f`, or "" when the folder
+  // does not fit the file's f_relpath.
+  static std::string FindCommonPath(const xml::Node& f, std::string folder);
+
+ protected:
+  void RunBody() override;
+  std::string ResultText() override;
+  std::string ResultsXml() override;
+  void AddStatusCounters(xml::Node e) override;
+  void ReleaseDocuments() override;
+
+ private:
+  // One results copy of an application, with the ids of its computer, drive and folder: Compare
+  // only appends, and each level is numbered from a growing counter, so these ids order the copies
+  // as the document does.
+  struct ApplicationCopy {
+    int32_t computer, drive, folder;
+    xml::Node element;
+  };
+
+  void Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& localFiles,
+               xml::DocumentPtr& fingerprint);
+  void Match();
+  void Finish();
+  bool MatchApplication(xml::Node a);
+  bool MatchVersion(xml::Node v);
+  void RaiseApplicationProgress(xml::Node a, bool matched);
+  // The path of the candidate's file named `name`, on its own computer or through the network.
+  static std::string CandidatePath(const LocalFileRecord& record, const std::string& name);
+
+  void FillRecordset();
+  int16_t MatchFile(const std::string& path, const xml::Node& f);
+  bool UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask);
+
+  int16_t RemoveIncompleteApplications(const std::string& id, int32_t highestSequence);
+  void RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence);
+  // Takes out one copy without versions, with whatever that leaves empty; false when none is left.
+  bool RemoveEmptiedCopy(const std::string& id);
+  void RememberCopy(xml::Node copy);
+  // The copies of the application with this a_id, in document order.
+  std::vector<xml::Node> CopiesOf(const std::string& id) const;
+  void ForgetCopy(const std::string& id, xml::Node copy);
+
+  std::unique_ptr<fs::FileSystem> objFSO;
+  std::unique_ptr<Schema> objSchema;
+
+  xml::DocumentPtr objApplicationOptionsDOM;
+  xml::DocumentPtr objLocalFilesDOM;
+  xml::DocumentPtr objFingerprintDOM;
+  xml::DocumentPtr objResultsDOM;
+  std::unique_ptr<LocalFileIndex> rsLocalFiles;
+
+  int32_t e_a_total = 0;
+  int32_t e_a_count = 0;
+  int32_t e_match_count = 0;
+  int32_t lngComputerCounter = 0;
+  int32_t lngDriveCounter = 0;
+  int32_t lngFolderCounter = 0;
+  std::string startTime_;  // formatted
+
+  // Every results copy of an application by a_id, so that pruning one application never scans
+  // the whole results.
+  std::unordered_map<std::string, std::vector<ApplicationCopy>> copiesById_;
+  std::unordered_set<const void*> knownCopies_;
+};
+
+}  // namespace trl

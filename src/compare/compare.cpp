@@ -1,0 +1,226 @@
+#include "trl/compare.h"
+
+#include "compare/compare_names.h"
+#include "compare/local_file_index.h"
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/fixes.h"
+#include "frame/general.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "platform/clock.h"
+#include "platform/convert.h"
+#include "platform/fs/posix/posix_file_system.h"
+#include "platform/text.h"
+#include "schema/schema.h"
+
+namespace trl {
+
+using compare::kClass;
+
+namespace {
+
+constexpr int32_t kCompareMode = 2;
+
+}  // namespace
+
+Compare::Compare() : Compare(nullptr) {
+  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject", [] {
+    fs::ShareTable shares;
+    shares.AddSystemMounts();
+    return fs::CreatePosixFileSystem(std::move(shares));
+  });
+}
+
+Compare::Compare(std::unique_ptr<fs::FileSystem> fileSystem)
+    : Worker(kClass, kCompareMode),
+      objFSO(std::move(fileSystem)),
+      objSchema(
+          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+
+Compare::~Compare() = default;
+
+std::string Compare::Start(xml::DocumentPtr applicationOptions, xml::DocumentPtr localFiles,
+                           xml::DocumentPtr fingerprint) {
+  return StartFrame([&] { Prepare(applicationOptions, localFiles, fingerprint); });
+}
+
+void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& localFiles,
+                      xml::DocumentPtr& fingerprint) {
+  OnError on{kClass, compare::kStartLabel};
+  startTime_ = FormatDateTime(Now());
+  auto orEmpty = [](xml::DocumentPtr& document) {
+    return document ? document : std::make_shared<xml::Document>();
+  };
+  objApplicationOptionsDOM = orEmpty(applicationOptions);
+  objLocalFilesDOM = orEmpty(localFiles);
+  objFingerprintDOM = orEmpty(fingerprint);
+  objResultsDOM = std::make_shared<xml::Document>();
+  on([&] { objResultsDOM->SetDocumentElement(objResultsDOM->CreateElement(vocab::results_root)); });
+  lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
+  on([&] { UpgradeFingerprintData(*objFingerprintDOM); });
+  e_a_total = e_a_count = e_match_count = 0;
+  rsLocalFiles.reset();
+  copiesById_.clear();
+  knownCopies_.clear();
+}
+
+void Compare::RunBody() { Match(); }
+
+void Compare::Match() {
+  OnError on{kClass, compare::kMatchLabel};
+  std::vector<xml::Node> applications;
+  on([&] {
+    applications = objFingerprintDOM->AsNode().GetElementsByTagName(vocab::a);
+    e_a_total = ToInt32(static_cast<double>(applications.size()));
+  });
+  bool hasFiles = false;
+  on([&] { hasFiles = !objLocalFilesDOM->AsNode().GetElementsByTagName(vocab::f).empty(); });
+  if (hasFiles) {
+    BeginRun(on);
+    FillRecordset();
+    for (const xml::Node& a : applications) {
+      YieldIfAsynchronous(on);
+      if (status_ == kStatusCancelled) break;
+      on([&] { MatchApplication(a); });
+    }
+  }
+  Finish();
+}
+
+void Compare::Finish() {
+  OnError on{kClass, compare::kMatchLabel};
+  std::string endTime = FormatDateTime(Now());
+  on([&] { AddEventsXML(*objResultsDOM); });
+  xml::Node root;
+  on([&] { root = objResultsDOM->DocumentElement(); });
+  xml::Node localRoot;
+  on([&] { localRoot = objLocalFilesDOM->DocumentElement(); });
+  for (std::string_view attribute : {vocab::search_start, vocab::search_end}) {
+    on([&] {
+      root.SetAttribute(attribute, FixNulls<std::string>(localRoot.GetAttribute(attribute), ""));
+    });
+  }
+  on([&] { root.SetAttribute(vocab::compare_start, startTime_); });
+  on([&] { root.SetAttribute(vocab::compare_end, endTime); });
+  if (SettleStatus()) on([&] { root.SetAttribute(vocab::cancelled, "1"); });
+  EndRun(on);
+}
+
+bool Compare::MatchApplication(xml::Node a) {
+  OnError on{kClass, compare::kMatchApplicationLabel};
+  bool selected = false;
+  on([&] { selected = Use(objSchema).IsApplicationSelected(a, *objApplicationOptionsDOM); });
+  if (!selected) return false;
+  on([&] { e_a_count = CheckedAdd(e_a_count, 1); });
+  RaiseApplicationProgress(a, false);
+
+  int32_t highest = 0;
+  bool found = false;
+  std::vector<xml::Node> versions;
+  on([&] { versions = a.GetElementsByTagName(vocab::v); });
+  for (const xml::Node& v : versions) {
+    on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
+    if (MatchVersion(v)) found = true;
+  }
+  if (found) {
+    int16_t remaining = 0;
+    on([&] { remaining = RemoveIncompleteApplications(TextOf(a, vocab::a_id), highest); });
+    if (remaining != 0) {
+      on([&] { e_match_count = CheckedAdd(e_match_count, 1); });
+      RaiseApplicationProgress(a, true);
+    }
+  }
+  return found;
+}
+
+void Compare::RaiseApplicationProgress(xml::Node a, bool matched) {
+  Progress(OnError{kClass, compare::kMatchApplicationLabel}, [&](xml::Node e) {
+    e.SetAttribute(vocab::e_a_count, std::to_string(e_a_count));
+    e.SetAttribute(vocab::e_match_count, std::to_string(e_match_count));
+    e.SetAttribute(vocab::e_matched, matched ? "1" : "0");
+    xml::Node copy = e.OwnerDocument().CreateElement(vocab::a);
+    for (const auto& [name, value] : a.Attributes()) copy.SetAttribute(name, value);
+    e.AppendChild(copy);
+  });
+}
+
+bool Compare::MatchVersion(xml::Node v) {
+  OnError on{kClass, compare::kMatchVersionLabel};
+  bool found = false;
+  std::vector<xml::Node> files;
+  on([&] { files = v.GetElementsByTagName(vocab::f); });
+  // What a failed step would have produced keeps its value from the file or candidate before.
+  std::string name, key, appFolder;
+  int16_t mask = -1;
+  xml::Node c, m, d, aResult, vResult;
+  for (const xml::Node& f : files) {
+    YieldIfAsynchronous(on);
+    on([&] { name = LowerCase(TextOf(f, vocab::f_name)); });
+    on([&] { key = Use(objSchema).EncodeName(name); });
+    LocalFileIndex::Matches candidates;
+    on([&] { candidates = Use(rsLocalFiles).Find(key); });
+    for (LocalFileRecord record : candidates) {
+      YieldIfAsynchronous(on);
+      appFolder = FindCommonPath(f, record.Folder());
+      if (!appFolder.empty()) {
+        std::string path = CandidatePath(record, name);
+        on([&] { mask = MatchFile(path, f); });
+      } else {
+        mask = -1;
+      }
+      YieldIfAsynchronous(on);
+      if (mask < 0) continue;
+      on([&] {
+        c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
+                                       objResultsDOM->DocumentElement(), lngComputerCounter);
+      });
+      on([&] {
+        m = Use(objSchema).AddDrive(record.Drive(), record.EncodedDrive(), c, lngDriveCounter);
+      });
+      on([&] {
+        Schema& schema = Use(objSchema);
+        d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), m, lngFolderCounter);
+      });
+      on([&] {
+        aResult = Use(objSchema).AddApplication(v.ParentNode(), d);
+        RememberCopy(aResult);
+      });
+      on([&] { vResult = Use(objSchema).AddVersion(v, aResult); });
+      on([&] { UpdateFileDetails(vResult, f, mask); });
+      found = true;
+    }
+  }
+  return found;
+}
+
+std::string Compare::CandidatePath(const LocalFileRecord& record, const std::string& name) {
+  std::string path;
+  if (!record.LocalMachine()) path = "\\\\" + record.Machine() + "\\";
+  path += record.Drive();
+  path += record.Folder();
+  path += name;
+  return path;
+}
+
+std::string Compare::ResultText() { return Use(objResultsDOM).DocumentElement().Xml(); }
+
+std::string Compare::ResultsXml() { return objResultsDOM ? objResultsDOM->Xml() : ""; }
+
+void Compare::AddStatusCounters(xml::Node e) {
+  e.SetAttribute(vocab::e_a_total, std::to_string(e_a_total));
+  e.SetAttribute(vocab::e_a_count, std::to_string(e_a_count));
+  e.SetAttribute(vocab::e_match_count, std::to_string(e_match_count));
+}
+
+void Compare::ReleaseDocuments() {
+  objApplicationOptionsDOM.reset();
+  objLocalFilesDOM.reset();
+  objFingerprintDOM.reset();
+  objResultsDOM.reset();
+  rsLocalFiles.reset();
+  copiesById_.clear();
+  knownCopies_.clear();
+}
+
+}  // namespace trl

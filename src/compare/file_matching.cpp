@@ -1,0 +1,95 @@
+// Scoring one local file against a fingerprint file, and recording the find in the results.
+#include <cmath>
+
+#include "compare/compare_names.h"
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "platform/clock.h"
+#include "platform/convert.h"
+#include "platform/fs/file_system.h"
+#include "platform/text.h"
+#include "schema/schema.h"
+#include "trl/compare.h"
+
+namespace trl {
+
+using compare::kClass;
+
+namespace {
+
+// Whether the file's value of property `kind` equals the expected text, compared the way the
+// kind's values compare. Readers run only for the kind asked, so a file is hashed only when a
+// property wants its digest.
+bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File& file,
+                    const std::string& expected) {
+  switch (kind) {
+    case 1:
+      return LowerCase(schema.ReadPropertyType1(file)) == LowerCase(expected);
+    case 2:
+      return ToInt32(static_cast<double>(schema.ReadPropertyType2(file))) == ToInt32(expected);
+    case 3:
+      return LowerCase(schema.ReadPropertyType3(file)) == LowerCase(expected);
+    case 4:
+      return FormatDateTime(schema.ReadPropertyType4(file)) == FormatDateTime(ToDateTime(expected));
+    default:
+      Raise(kErrUnknownPropertyType, "Unknown property type: " + std::to_string(kind), kClass,
+            compare::kMatchFileLabel);
+  }
+}
+
+}  // namespace
+
+int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
+  OnError on{kClass, compare::kMatchFileLabel};
+  int16_t mask = 0;
+  bool exists = false;
+  if (!on([&] { exists = Use(objFSO).FileExists(path); }) || !exists) return -1;
+  std::unique_ptr<fs::File> file;
+  on([&] { file = objFSO->GetFile(path); });
+  std::vector<xml::Node> properties;
+  on([&] { properties = f.GetElementsByTagName(vocab::p); });
+  // A value that cannot be read keeps what the property before gave.
+  int16_t kind = 0, weight = 0, bit = 0;
+  for (const xml::Node& p : properties) {
+    on([&] { kind = ToInt16(TextOf(p, vocab::p_type)); });
+    on([&] { weight = ToInt16(TextOf(p, vocab::p_weight)); });
+    on([&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
+    bool agrees = false;
+    on([&] {
+      agrees = PropertyAgrees(kind, Use(objSchema), Use(file), TextOf(p, vocab::p_value));
+    });
+    if (agrees) on([&] { mask = CheckedAdd16(mask, bit); });
+  }
+  return mask;
+}
+
+bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask) {
+  OnError on{kClass, compare::kUpdateFileDetailsLabel};
+  int32_t id = 0;
+  int16_t maxMask = 0, fileBit = 0;
+  on([&] { id = ToInt32(TextOf(f, vocab::f_id)); });
+  on([&] { maxMask = ToInt16(TextOf(f, vocab::p_max)); });
+  on([&] { fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
+  xml::Node copy;
+  on([&] { copy = objResultsDOM->FindChild(vResult, vocab::f, vocab::f_id, std::to_string(id)); });
+  bool firstFind = false;
+  on([&] { firstFind = TextOf(copy, vocab::f_exists) == "0"; });
+  if (!firstFind) return true;
+  on([&] { copy.SetAttribute(vocab::p_max, std::to_string(maxMask)); });
+  on([&] { copy.SetAttribute(vocab::p_act, std::to_string(mask)); });
+  on([&] { copy.SetAttribute(vocab::f_exists, "1"); });
+  int32_t versionScore = 0, filesFound = 0;
+  on([&] { versionScore = ToInt32(TextOf(vResult, vocab::v_act)); });
+  on([&] { filesFound = ToInt32(TextOf(vResult, vocab::f_act)); });
+  on([&] { vResult.SetAttribute(vocab::f_act, std::to_string(CheckedAdd(filesFound, 1))); });
+  if (maxMask == mask) {
+    on([&] {
+      vResult.SetAttribute(vocab::v_act, std::to_string(CheckedAdd(versionScore, fileBit)));
+    });
+  }
+  return true;
+}
+
+}  // namespace trl

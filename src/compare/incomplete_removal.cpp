@@ -1,0 +1,126 @@
+// Taking back the versions that lack a weighted file, and the results branches that leaves empty.
+#include <algorithm>
+#include <optional>
+#include <tuple>
+
+#include "compare/compare_names.h"
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/vocabulary.h"
+#include "platform/convert.h"
+#include "trl/compare.h"
+
+namespace trl {
+
+using compare::kClass;
+
+namespace {
+
+// The id in an element's first attribute, as the numbering wrote it.
+int32_t FirstId(const xml::Node& element) {
+  auto attributes = element.Attributes();
+  return attributes.empty() ? 0 : ToInt32(attributes.front().second);
+}
+
+}  // namespace
+
+int16_t Compare::RemoveIncompleteApplications(const std::string& id, int32_t highestSequence) {
+  OnError on{kClass, compare::kRemoveIncompleteLabel};
+  std::vector<xml::Node> copies;
+  on([&] { copies = CopiesOf(id); });
+  for (const xml::Node& copy : copies) RemoveIncompleteVersions(copy, highestSequence);
+  bool removed = true;
+  while (removed) {
+    removed = false;
+    on([&] { removed = RemoveEmptiedCopy(id); });
+  }
+  int16_t remaining = 0;
+  on([&] { remaining = ToInt16(static_cast<double>(CopiesOf(id).size())); });
+  return remaining;
+}
+
+void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) {
+  OnError on{kClass, compare::kRemoveIncompleteLabel};
+  int32_t filesMax = 0, filesFound = 0;
+  bool removed = true;
+  while (removed) {
+    removed = false;
+    std::vector<xml::Node> versions;
+    on([&] { versions = copy.ChildElements(vocab::v); });
+    for (xml::Node& v : versions) {
+      on([&] { filesMax = ToInt32(TextOf(v, vocab::f_max)); });
+      on([&] { filesFound = ToInt32(TextOf(v, vocab::f_act)); });
+      if (filesFound >= filesMax) continue;
+      size_t missing = 0;
+      on([&] { missing = v.CountNodes("./f[@f_exists='0' and @f_weight > 0]"); });
+      // A version goes only when a file that carries weight was not found; the selection is then
+      // made afresh.
+      if (missing != 0 && on([&] { copy.RemoveChild(v); })) {
+        removed = true;
+        break;
+      }
+    }
+  }
+  on([&] { copy.SetAttribute(vocab::a_max_seq, std::to_string(highestSequence)); });
+}
+
+bool Compare::RemoveEmptiedCopy(const std::string& id) {
+  xml::Node copy;
+  for (const xml::Node& candidate : CopiesOf(id)) {
+    if (candidate.ChildElements(vocab::v).empty()) {
+      copy = candidate;
+      break;
+    }
+  }
+  if (!copy) return false;
+  // With a single computer in the results, the computer goes with its last drive; with several,
+  // only the drive goes and the computer stays.
+  xml::Node d = copy.ParentNode();
+  xml::Node m = d.ParentNode();
+  xml::Node c = m.ParentNode();
+  xml::Node root = c.ParentNode();
+  if (d.ChildElements(vocab::a).size() != 1) {
+    d.RemoveChild(copy);
+  } else if (m.ChildElements(vocab::d).size() != 1) {
+    m.RemoveChild(d);
+  } else if (c.ChildElements(vocab::m).size() == 1 && root.ChildElements(vocab::c).size() == 1) {
+    root.RemoveChild(c);
+  } else {
+    c.RemoveChild(m);
+  }
+  ForgetCopy(id, copy);
+  return true;
+}
+
+void Compare::RememberCopy(xml::Node copy) {
+  // A copy without an a_id is one no selection by a_id would find.
+  std::optional<std::string> id = copy.GetAttribute(vocab::a_id);
+  if (!id || knownCopies_.contains(copy.Id())) return;
+  xml::Node d = copy.ParentNode();
+  xml::Node m = d.ParentNode();
+  ApplicationCopy entry{FirstId(m.ParentNode()), FirstId(m), FirstId(d), copy};
+  auto before = [](const ApplicationCopy& x, const ApplicationCopy& y) {
+    return std::tie(x.computer, x.drive, x.folder) < std::tie(y.computer, y.drive, y.folder);
+  };
+  auto& copies = copiesById_[*id];
+  copies.insert(std::upper_bound(copies.begin(), copies.end(), entry, before), entry);
+  knownCopies_.insert(copy.Id());
+}
+
+std::vector<xml::Node> Compare::CopiesOf(const std::string& id) const {
+  // The selection cannot carry an apostrophe; such an id matches nothing, as it does in a search.
+  std::vector<xml::Node> copies;
+  if (id.find('\'') != std::string::npos) return copies;
+  auto found = copiesById_.find(id);
+  if (found == copiesById_.end()) return copies;
+  for (const ApplicationCopy& copy : found->second) copies.push_back(copy.element);
+  return copies;
+}
+
+void Compare::ForgetCopy(const std::string& id, xml::Node copy) {
+  knownCopies_.erase(copy.Id());
+  auto& copies = copiesById_[id];
+  std::erase_if(copies, [&](const ApplicationCopy& entry) { return entry.element == copy; });
+}
+
+}  // namespace trl

@@ -1,0 +1,123 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+namespace trl {
+
+class LocalFileIndex;
+
+// One local file of the index: where it is and what it is called. A light view into its index,
+// valid while the index lives.
+class LocalFileRecord {
+ public:
+  int32_t FileID() const;
+  const std::string& Machine() const;
+  const std::string& EncodedMachine() const;
+  bool LocalMachine() const;
+  const std::string& Drive() const;
+  const std::string& EncodedDrive() const;
+  const std::string& Folder() const;
+  const std::string& EncodedFolder() const;
+  std::string_view Filename() const;
+  std::string_view EncodedFilename() const;
+  // Drive, folder and file name joined; behind "\\" and the computer when it is not this one.
+  std::string FullPath() const;
+
+ private:
+  friend class LocalFileIndex;
+  LocalFileRecord(const LocalFileIndex* index, uint32_t record) : index_(index), record_(record) {}
+
+  const LocalFileIndex* index_;
+  uint32_t record_;
+};
+
+// The local files of a search flattened into records, in the order they were added, with an index
+// from the encoded file name (regardless of case) to its records, also in the order added. The
+// computer and drive of a record are shared with the other records of its drive and its folder
+// with those of its folder, so that a record costs little more than its names.
+class LocalFileIndex {
+ public:
+  // The records under one encoded name, in the order they were added.
+  class Matches {
+   public:
+    class Iterator {
+     public:
+      LocalFileRecord operator*() const { return {index_, record_}; }
+      Iterator& operator++();
+      bool operator==(const Iterator& other) const { return record_ == other.record_; }
+
+     private:
+      friend class Matches;
+      Iterator(const LocalFileIndex* index, uint32_t record) : index_(index), record_(record) {}
+      const LocalFileIndex* index_;
+      uint32_t record_;
+    };
+
+    Matches() = default;  // none
+
+    Iterator begin() const { return {index_, first_}; }
+    Iterator end() const { return {index_, kNone}; }
+    bool empty() const { return first_ == kNone; }
+    size_t size() const;
+
+   private:
+    friend class LocalFileIndex;
+    Matches(const LocalFileIndex* index, uint32_t first) : index_(index), first_(first) {}
+    const LocalFileIndex* index_ = nullptr;
+    uint32_t first_ = kNone;
+  };
+
+  // The computer and drive of the records added next.
+  void AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
+                std::string drive, std::string encodedDrive);
+  // The folder of the records added next, on the last drive added (none yet: an empty one).
+  void AddFolder(std::string folder, std::string encodedFolder);
+  // A record in the last folder added (none yet: an empty one). The encoded name is kept
+  // lower-cased, the plain name as given.
+  void AddFile(int32_t fileId, std::string_view filename, std::string_view encodedFilename);
+
+  // The records whose encoded file name equals `key`, letter case aside.
+  Matches Find(std::string_view key) const;
+  size_t Size() const { return records_.size(); }
+  LocalFileRecord At(size_t record) const { return {this, static_cast<uint32_t>(record)}; }
+
+ private:
+  friend class LocalFileRecord;
+  static constexpr uint32_t kNone = UINT32_MAX;
+
+  struct DriveEntry {
+    std::string machine, encodedMachine;
+    bool localMachine;
+    std::string drive, encodedDrive;
+  };
+  struct FolderEntry {
+    std::string folder, encodedFolder;
+    uint32_t drive;
+  };
+  struct Chain {
+    uint32_t first, last;
+  };
+  // 24 bytes. The encoded name is the key the record hangs under; the plain name is kept only where
+  // it differs from the encoded one (in `names_`, at `filename`).
+  struct Record {
+    int32_t fileId;
+    uint32_t folder;
+    uint32_t next;  // the next record under the same key
+    uint32_t filename = kNone;
+    const std::string* encodedFilename;
+  };
+
+  void EnsureFolder();
+
+  std::vector<DriveEntry> drives_;
+  std::vector<FolderEntry> folders_;
+  std::vector<Record> records_;
+  std::string names_;  // plain names that differ from their encoded form, each followed by '\0'
+  std::unordered_map<std::string, Chain> byName_;
+};
+
+}  // namespace trl

@@ -1,0 +1,77 @@
+// The local-files side of a match: the index of the files a search recorded, and the test of
+// whether a local folder fits where a fingerprint file expects to lie.
+#include <new>
+
+#include "compare/compare_names.h"
+#include "compare/local_file_index.h"
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "platform/convert.h"
+#include "platform/text.h"
+#include "trl/compare.h"
+
+namespace trl {
+
+using compare::kClass;
+
+void Compare::FillRecordset() {
+  OnError on{kClass, compare::kFillRecordsetLabel};
+  rsLocalFiles.reset();
+  on([&] {
+    try {
+      rsLocalFiles = std::make_unique<LocalFileIndex>();
+    } catch (const std::bad_alloc&) {
+      Raise(kErrUnableToCreate, "Unable to create an instance of ADODB.Recordset", kClass,
+            compare::kFillRecordsetLabel);
+    }
+  });
+  int32_t fileId = 0;
+  std::vector<xml::Node> computers;
+  on([&] { computers = Use(objLocalFilesDOM).AsNode().GetElementsByTagName(vocab::c); });
+  // A value that cannot be read keeps what the element before gave.
+  std::string machine, encodedMachine, drive, encodedDrive, folder, encodedFolder, filename,
+      encodedFilename;
+  for (const xml::Node& c : computers) {
+    on([&] { machine = TextOf(c, vocab::c_text); });
+    on([&] { encodedMachine = TextOf(c, vocab::c_name); });
+    bool local = c.GetAttribute(vocab::c_local) == "1";
+    for (const xml::Node& m : c.ChildElements(vocab::m)) {
+      on([&] { drive = TextOf(m, vocab::m_text); });
+      on([&] { encodedDrive = TextOf(m, vocab::m_name); });
+      on([&] { Use(rsLocalFiles).AddDrive(machine, encodedMachine, local, drive, encodedDrive); });
+      for (const xml::Node& d : m.ChildElements(vocab::d)) {
+        on([&] { folder = LowerCase(TextOf(d, vocab::d_text)); });
+        on([&] { encodedFolder = LowerCase(TextOf(d, vocab::d_name)); });
+        on([&] { Use(rsLocalFiles).AddFolder(folder, encodedFolder); });
+        for (const xml::Node& f : d.ChildElements(vocab::f)) {
+          on([&] { fileId = CheckedAdd(fileId, 1); });
+          on([&] { filename = LowerCase(TextOf(f, vocab::f_text)); });
+          on([&] { encodedFilename = TextOf(f, vocab::f_name); });
+          on([&] { Use(rsLocalFiles).AddFile(fileId, filename, encodedFilename); });
+        }
+      }
+    }
+  }
+}
+
+std::string Compare::FindCommonPath(const xml::Node& f, std::string folder) {
+  OnError on{kClass, compare::kFindCommonPathLabel};
+  std::string rel;
+  on([&] { rel = LowerCase(TextOf(f, vocab::f_relpath)); });
+  if (rel.empty()) return folder;
+  if (!rel.ends_with('\\')) rel += '\\';
+  // Lengths in bytes decide as lengths in characters would: every later test compares whole texts.
+  if (folder.size() < rel.size()) return "";
+  if (!folder.ends_with('\\')) folder += '\\';
+  bool fullPath = false;
+  on([&] { fullPath = f.GetAttribute(vocab::f_fullpath) == "True"; });
+  if (fullPath) return folder == rel ? rel : "";
+  if (!rel.starts_with('\\')) rel.insert(rel.begin(), '\\');
+  if (!folder.ends_with(rel)) return "";
+  folder.resize(folder.size() - (rel.size() - 1));
+  return folder;
+}
+
+}  // namespace trl
