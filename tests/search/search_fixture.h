@@ -10,18 +10,13 @@
 
 #include "frame/error_handler.h"
 #include "platform/fs/posix/posix_file_system.h"
+#include "support/documents.h"
 #include "support/reported_events.h"
 #include "support/temp_tree.h"
 #include "trl/search.h"
 #include "trl/xml.h"
 
 namespace trl::testing {
-
-inline xml::DocumentPtr Parse(std::string_view text) {
-  auto document = std::make_shared<xml::Document>();
-  EXPECT_TRUE(document->LoadXml(text)) << document->LastParseError().reason << " in " << text;
-  return document;
-}
 
 // A folder entry of the search options, walked by default. Paths here need no escapes.
 inline std::string Entry(int id, std::string_view folder,
@@ -50,39 +45,6 @@ inline std::string LocalOptions(std::string_view folder,
          "</trl_searchoptions>";
 }
 
-// The words of `text`, for short tables.
-inline std::vector<std::string> Words(std::string_view text) {
-  std::vector<std::string> words;
-  for (size_t start = 0, end = 0; start < text.size(); start = end + 1) {
-    end = std::min(text.find(' ', start), text.size());
-    if (end > start) words.emplace_back(text.substr(start, end - start));
-  }
-  return words;
-}
-
-// The values of `attribute` on what `xpath` selects, in document order.
-inline std::vector<std::string> ValuesOf(xml::Document& document, std::string_view xpath,
-                                         std::string_view attribute) {
-  std::vector<std::string> values;
-  for (const xml::Node& node : document.AsNode().SelectNodes(xpath)) {
-    values.push_back(node.GetAttribute(attribute).value_or("<absent>"));
-  }
-  return values;
-}
-
-// The events a run appended to its results.
-inline std::vector<ReportedEvent> EventsIn(xml::Document& document) {
-  std::vector<ReportedEvent> events;
-  for (const xml::Node& e : document.AsNode().SelectNodes("/*/events/event")) {
-    events.push_back(
-        {std::stoi(e.GetAttribute("number").value_or("0")),
-         std::stoi(e.GetAttribute("kind").value_or("0")), e.GetAttribute("class").value_or(""),
-         e.GetAttribute("procedure").value_or(""), e.GetAttribute("description").value_or(""),
-         e.GetAttribute("source").value_or("")});
-  }
-  return events;
-}
-
 // The document without the run's times, which no expectation can know.
 inline std::string Untimed(xml::Document& document) {
   xml::Node root = document.DocumentElement();
@@ -98,11 +60,6 @@ inline std::vector<std::string> FoldersBelow(xml::Document& results, std::string
     if (folder.starts_with(root)) folder.erase(0, root.size());
   }
   return folders;
-}
-
-inline std::string Lower(std::string text) {
-  for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return text;
 }
 
 class SearchTest : public ::testing::Test {
