@@ -9,19 +9,13 @@
 #include <vector>
 
 #include "command_error.h"
+#include "command_test_support.h"
 #include "document_files.h"
 #include "frame/error_handler.h"
 #include "support/temp_tree.h"
 
 namespace trl::cli {
 namespace {
-
-std::string ReadFile(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  std::stringstream text;
-  text << in.rdbuf();
-  return text.str();
-}
 
 // The message of the CommandError that loading `path` raises, "" when it loads.
 std::string LoadError(const std::string& path) {
@@ -77,12 +71,7 @@ TEST(DocumentFilesTest, OutputThatCannotBeWrittenFailsTheCommand) {
 
 // Runs `trllocator search` with `args`; answers the exit code.
 int RunSearchCommand(std::vector<std::string> args) {
-  CLI::App app;
-  auto run = AddSearchCommand(app);
-  args.insert(args.begin(), "search");
-  std::reverse(args.begin(), args.end());  // CLI11 takes the arguments last first
-  app.parse(args);
-  return run();
+  return RunCommand(AddSearchCommand, "search", std::move(args));
 }
 
 TEST(SearchCommandTest, WritesTheDocumentAndPrintsWhatTheStageReports) {
