@@ -22,6 +22,12 @@ namespace {
 
 constexpr int32_t kCompareMode = 2;
 
+// Every `tag` element of the document, as a selection of "//tag" from its root gives them.
+std::vector<xml::Node> EveryElement(xml::Document& document, std::string_view tag) {
+  if (!document.DocumentElement()) Fail(kObjectNotSet);
+  return document.AsNode().GetElementsByTagName(tag);
+}
+
 }  // namespace
 
 Compare::Compare() : Compare(nullptr) {
@@ -71,11 +77,11 @@ void Compare::Match() {
   OnError on{kClass, compare::kMatchLabel};
   std::vector<xml::Node> applications;
   on([&] {
-    applications = objFingerprintDOM->AsNode().GetElementsByTagName(vocab::a);
+    applications = EveryElement(*objFingerprintDOM, vocab::a);
     e_a_total = ToInt32(static_cast<double>(applications.size()));
   });
   bool hasFiles = false;
-  on([&] { hasFiles = !objLocalFilesDOM->AsNode().GetElementsByTagName(vocab::f).empty(); });
+  on([&] { hasFiles = !EveryElement(*objLocalFilesDOM, vocab::f).empty(); });
   if (hasFiles) {
     BeginRun(on);
     FillRecordset();

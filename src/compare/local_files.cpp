@@ -1,5 +1,7 @@
 // The local-files side of a match: the index of the files a search recorded, and the test of
 // whether a local folder fits where a fingerprint file expects to lie.
+#include "compare/local_files.h"
+
 #include <new>
 
 #include "compare/compare_names.h"
@@ -16,6 +18,40 @@ namespace trl {
 
 using compare::kClass;
 
+void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
+  OnError on{kClass, compare::kFillRecordsetLabel};
+  int32_t fileId = 0;
+  std::vector<xml::Node> computers;
+  on([&] {
+    if (!localFiles.DocumentElement()) Fail(kObjectNotSet);
+    computers = localFiles.AsNode().GetElementsByTagName(vocab::c);
+  });
+  // A value that cannot be read keeps what the element before gave.
+  std::string machine, encodedMachine, drive, encodedDrive, folder, encodedFolder, filename,
+      encodedFilename;
+  for (const xml::Node& c : computers) {
+    on([&] { machine = TextOf(c, vocab::c_text); });
+    on([&] { encodedMachine = TextOf(c, vocab::c_name); });
+    bool local = c.GetAttribute(vocab::c_local) == "1";
+    for (const xml::Node& m : c.ChildElements(vocab::m)) {
+      on([&] { drive = TextOf(m, vocab::m_text); });
+      on([&] { encodedDrive = TextOf(m, vocab::m_name); });
+      on([&] { Use(index).AddDrive(machine, encodedMachine, local, drive, encodedDrive); });
+      for (const xml::Node& d : m.ChildElements(vocab::d)) {
+        on([&] { folder = LowerCase(TextOf(d, vocab::d_text)); });
+        on([&] { encodedFolder = LowerCase(TextOf(d, vocab::d_name)); });
+        on([&] { Use(index).AddFolder(folder, encodedFolder); });
+        for (const xml::Node& f : d.ChildElements(vocab::f)) {
+          on([&] { fileId = CheckedAdd(fileId, 1); });
+          on([&] { filename = LowerCase(TextOf(f, vocab::f_text)); });
+          on([&] { encodedFilename = TextOf(f, vocab::f_name); });
+          on([&] { Use(index).AddFile(fileId, filename, encodedFilename); });
+        }
+      }
+    }
+  }
+}
+
 void Compare::FillRecordset() {
   OnError on{kClass, compare::kFillRecordsetLabel};
   rsLocalFiles.reset();
@@ -27,33 +63,7 @@ void Compare::FillRecordset() {
             compare::kFillRecordsetLabel);
     }
   });
-  int32_t fileId = 0;
-  std::vector<xml::Node> computers;
-  on([&] { computers = Use(objLocalFilesDOM).AsNode().GetElementsByTagName(vocab::c); });
-  // A value that cannot be read keeps what the element before gave.
-  std::string machine, encodedMachine, drive, encodedDrive, folder, encodedFolder, filename,
-      encodedFilename;
-  for (const xml::Node& c : computers) {
-    on([&] { machine = TextOf(c, vocab::c_text); });
-    on([&] { encodedMachine = TextOf(c, vocab::c_name); });
-    bool local = c.GetAttribute(vocab::c_local) == "1";
-    for (const xml::Node& m : c.ChildElements(vocab::m)) {
-      on([&] { drive = TextOf(m, vocab::m_text); });
-      on([&] { encodedDrive = TextOf(m, vocab::m_name); });
-      on([&] { Use(rsLocalFiles).AddDrive(machine, encodedMachine, local, drive, encodedDrive); });
-      for (const xml::Node& d : m.ChildElements(vocab::d)) {
-        on([&] { folder = LowerCase(TextOf(d, vocab::d_text)); });
-        on([&] { encodedFolder = LowerCase(TextOf(d, vocab::d_name)); });
-        on([&] { Use(rsLocalFiles).AddFolder(folder, encodedFolder); });
-        for (const xml::Node& f : d.ChildElements(vocab::f)) {
-          on([&] { fileId = CheckedAdd(fileId, 1); });
-          on([&] { filename = LowerCase(TextOf(f, vocab::f_text)); });
-          on([&] { encodedFilename = TextOf(f, vocab::f_name); });
-          on([&] { Use(rsLocalFiles).AddFile(fileId, filename, encodedFilename); });
-        }
-      }
-    }
-  }
+  on([&] { FillLocalFileIndex(Use(objLocalFilesDOM), rsLocalFiles.get()); });
 }
 
 std::string Compare::FindCommonPath(const xml::Node& f, std::string folder) {

@@ -65,11 +65,15 @@ void UpgradeFingerprintData(xml::Document& fingerprint) {
   int32_t propertyWeight = 0;
 
   std::vector<xml::Node> versions;
-  on([&] { versions = fingerprint.DocumentElement().SelectNodes("//v"); });
+  on([&] {
+    // Every v of the document, as a selection of "//v" from the root would give.
+    if (!fingerprint.DocumentElement()) Fail(kObjectNotSet);
+    versions = fingerprint.AsNode().GetElementsByTagName(vocab::v);
+  });
   for (xml::Node v : versions) {
     int32_t versionSum = 0;
     std::vector<xml::Node> files;
-    on([&] { files = v.SelectNodes(".//f"); });
+    on([&] { files = v.GetElementsByTagName(vocab::f); });
     for (xml::Node f : files) {
       on([&] { fileWeight = ToInt32(TextOf(f, vocab::f_weight)); });
       int32_t fileBit = CalculateWeightMask(fileWeight);
@@ -78,7 +82,7 @@ void UpgradeFingerprintData(xml::Document& fingerprint) {
 
       int32_t fileSum = 0;
       std::vector<xml::Node> properties;
-      on([&] { properties = f.SelectNodes("./p"); });
+      on([&] { properties = f.ChildElements(vocab::p); });
       for (xml::Node p : properties) {
         on([&] { propertyWeight = ToInt32(TextOf(p, vocab::p_weight)); });
         int32_t propertyBit = CalculateWeightMask(propertyWeight);

@@ -1,8 +1,8 @@
 #include <openssl/evp.h>
 
+#include <algorithm>
 #include <array>
 #include <memory>
-#include <vector>
 
 #include "platform/failure.h"
 #include "schema/pe_version.h"
@@ -20,10 +20,12 @@ std::string Md5Hex(fs::FileReader& reader) {
   if (!context || EVP_DigestInit_ex(context.get(), EVP_md5(), nullptr) != 1) {
     Fail(kInvalidArgument, "MD5 digest unavailable");
   }
-  std::vector<unsigned char> buffer(kDigestChunk);
+  // Sized to the file, up to a limit, and not cleared: most files are small and many are hashed.
+  size_t chunk = static_cast<size_t>(std::clamp<uint64_t>(reader.Size(), 1, kDigestChunk));
+  std::unique_ptr<unsigned char[]> buffer(new unsigned char[chunk]);
   uint64_t offset = 0;
-  while (size_t got = reader.ReadAt(offset, buffer.data(), buffer.size())) {
-    EVP_DigestUpdate(context.get(), buffer.data(), got);
+  while (size_t got = reader.ReadAt(offset, buffer.get(), chunk)) {
+    EVP_DigestUpdate(context.get(), buffer.get(), got);
     offset += got;
   }
   std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};

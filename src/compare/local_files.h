@@ -1,0 +1,14 @@
+#pragma once
+
+#include "trl/xml.h"
+
+namespace trl {
+
+class LocalFileIndex;
+
+// Adds every file of a local-files document to `index`, in document order: the `f` children of
+// each `d` of each `m` of every `c`, numbered from 1. A missing index or unreadable value is
+// reported (as Compare's FillRecordset) and filling goes on.
+void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index);
+
+}  // namespace trl
