@@ -13,6 +13,7 @@
 namespace trl {
 
 class LocalFileIndex;
+struct LocalFileFacts;
 class LocalFileRecord;
 class Schema;
 namespace fs {
@@ -101,6 +102,8 @@ class Compare : public Worker {
   // the whole results.
   std::unordered_map<std::string, std::vector<ApplicationCopy>> copiesById_;
   std::unordered_set<const void*> knownCopies_;
+  // What the run has learnt of each local file it tested, by path.
+  std::unordered_map<std::string, std::unique_ptr<LocalFileFacts>> filesSeen_;
 };
 
 }  // namespace trl

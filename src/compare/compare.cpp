@@ -1,6 +1,7 @@
 #include "trl/compare.h"
 
 #include "compare/compare_names.h"
+#include "compare/file_facts.h"
 #include "compare/local_file_index.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
@@ -69,6 +70,7 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
   rsLocalFiles.reset();
   copiesById_.clear();
   knownCopies_.clear();
+  filesSeen_.clear();
 }
 
 void Compare::RunBody() { Match(); }
@@ -227,6 +229,7 @@ void Compare::ReleaseDocuments() {
   rsLocalFiles.reset();
   copiesById_.clear();
   knownCopies_.clear();
+  filesSeen_.clear();
 }
 
 }  // namespace trl

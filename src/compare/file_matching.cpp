@@ -2,6 +2,7 @@
 #include <cmath>
 
 #include "compare/compare_names.h"
+#include "compare/file_facts.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
 #include "frame/use_object.h"
@@ -20,19 +21,24 @@ using compare::kClass;
 namespace {
 
 // Whether the file's value of property `kind` equals the expected text, compared the way the
-// kind's values compare. Readers run only for the kind asked, so a file is hashed only when a
-// property wants its digest.
-bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File& file,
+// kind's values compare. Only the kind asked for is read, so a file is hashed only when a property
+// wants its digest.
+bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File* file, LocalFileFacts& facts,
                     const std::string& expected) {
+  auto local = [&](auto& learnt, auto reader) -> decltype(auto) {
+    return learnt.Get([&] { return (schema.*reader)(Use(file)); });
+  };
   switch (kind) {
     case 1:
-      return LowerCase(schema.ReadPropertyType1(file)) == LowerCase(expected);
+      return LowerCase(local(facts.version, &Schema::ReadPropertyType1)) == LowerCase(expected);
     case 2:
-      return ToInt32(static_cast<double>(schema.ReadPropertyType2(file))) == ToInt32(expected);
+      return ToInt32(static_cast<double>(local(facts.size, &Schema::ReadPropertyType2))) ==
+             ToInt32(expected);
     case 3:
-      return LowerCase(schema.ReadPropertyType3(file)) == LowerCase(expected);
+      return LowerCase(local(facts.digest, &Schema::ReadPropertyType3)) == LowerCase(expected);
     case 4:
-      return FormatDateTime(schema.ReadPropertyType4(file)) == FormatDateTime(ToDateTime(expected));
+      return FormatDateTime(local(facts.written, &Schema::ReadPropertyType4)) ==
+             FormatDateTime(ToDateTime(expected));
     default:
       Raise(kErrUnknownPropertyType, "Unknown property type: " + std::to_string(kind), kClass,
             compare::kMatchFileLabel);
@@ -44,10 +50,16 @@ bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File& file,
 int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
   OnError on{kClass, compare::kMatchFileLabel};
   int16_t mask = 0;
+  auto& seen = filesSeen_[path];
+  if (!seen) seen = std::make_unique<LocalFileFacts>();
+  LocalFileFacts& facts = *seen;
   bool exists = false;
-  if (!on([&] { exists = Use(objFSO).FileExists(path); }) || !exists) return -1;
-  std::unique_ptr<fs::File> file;
-  on([&] { file = objFSO->GetFile(path); });
+  if (!on([&] { exists = facts.exists.Get([&] { return Use(objFSO).FileExists(path); }); }) ||
+      !exists) {
+    return -1;
+  }
+  const fs::File* file = nullptr;
+  on([&] { file = facts.file.Get([&] { return objFSO->GetFile(path); }).get(); });
   std::vector<xml::Node> properties;
   on([&] { properties = f.GetElementsByTagName(vocab::p); });
   // A value that cannot be read keeps what the property before gave.
@@ -58,7 +70,7 @@ int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
     on([&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
     bool agrees = false;
     on([&] {
-      agrees = PropertyAgrees(kind, Use(objSchema), Use(file), TextOf(p, vocab::p_value));
+      agrees = PropertyAgrees(kind, Use(objSchema), file, facts, TextOf(p, vocab::p_value));
     });
     if (agrees) on([&] { mask = CheckedAdd16(mask, bit); });
   }

@@ -1,0 +1,49 @@
+#pragma once
+
+#include <cstdint>
+#include <exception>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "platform/clock.h"
+#include "platform/fs/file_system.h"
+
+namespace trl {
+
+// One thing learnt of a local file: the value read, or the failure reading it gave, which is
+// raised again at every later use so that each use reports as a fresh read would.
+template <class T>
+class Learnt {
+ public:
+  template <class Read>
+  const T& Get(Read&& read) {
+    if (failure_) std::rethrow_exception(failure_);
+    if (!value_) {
+      try {
+        value_.emplace(read());
+      } catch (...) {
+        failure_ = std::current_exception();
+        throw;
+      }
+    }
+    return *value_;
+  }
+
+ private:
+  std::optional<T> value_;
+  std::exception_ptr failure_;
+};
+
+// What a run has learnt of one local file it tested. A common file name is tested against the
+// files of many fingerprint versions, so each file is looked at, opened and hashed once a run.
+struct LocalFileFacts {
+  Learnt<bool> exists;
+  Learnt<std::unique_ptr<fs::File>> file;
+  Learnt<std::string> version;  // property kind 1
+  Learnt<int64_t> size;         // kind 2
+  Learnt<std::string> digest;   // kind 3
+  Learnt<DateTime> written;     // kind 4
+};
+
+}  // namespace trl
