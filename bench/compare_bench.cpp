@@ -1,8 +1,9 @@
-// compare_bench DATA_DIR [RUNS]
+// compare_bench DATA_DIR [RUNS] [OUTPUT]
 //
 // Times the compare stage on the data `make_compare_data` wrote to DATA_DIR: loading the two
 // documents, then a synchronous Compare (best of RUNS, default 2, so the installed files are
-// warm), and the heap the local-file index holds per record.
+// warm), and the heap the local-file index holds per record. OUTPUT, when given, receives the
+// matches of the last run.
 #include <malloc.h>
 
 #include <chrono>
@@ -41,7 +42,7 @@ size_t HeapInUse() { return mallinfo2().uordblks; }
 
 int main(int argc, char** argv) {
   if (argc < 2) {
-    std::fprintf(stderr, "usage: compare_bench DATA_DIR [RUNS]\n");
+    std::fprintf(stderr, "usage: compare_bench DATA_DIR [RUNS] [OUTPUT]\n");
     return 2;
   }
   std::string dir = argv[1];
@@ -74,6 +75,14 @@ int main(int argc, char** argv) {
     double took = Seconds(start);
     if (run == 0 || took < best) best = took;
     trl::ReleaseSharedReporter();
+  }
+  if (argc > 3) {
+    std::FILE* out = std::fopen(argv[3], "w");
+    if (!out || std::fwrite(results.data(), 1, results.size(), out) != results.size()) {
+      std::fprintf(stderr, "compare_bench: cannot write %s\n", argv[3]);
+      return 1;
+    }
+    std::fclose(out);
   }
   trl::xml::Document matches;
   matches.LoadXml(results);

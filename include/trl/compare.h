@@ -14,6 +14,8 @@ namespace trl {
 
 class LocalFileIndex;
 struct LocalFileFacts;
+struct VersionDraft;
+struct VersionFiles;
 class LocalFileRecord;
 class Schema;
 namespace fs {
@@ -64,6 +66,10 @@ class Compare : public Worker {
   void Finish();
   bool MatchApplication(xml::Node a);
   bool MatchVersion(xml::Node v);
+  // Whether the application's copies will certainly be pruned once its versions are matched, so
+  // that version copies can be drafted first and made only when complete.
+  bool PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const;
+  void MakeVersionCopy(const xml::Node& v, const VersionDraft& draft);
   void RaiseApplicationProgress(xml::Node a, bool matched);
   // The path of the candidate's file named `name`, on its own computer or through the network.
   static std::string CandidatePath(const LocalFileRecord& record, const std::string& name);
@@ -71,6 +77,9 @@ class Compare : public Worker {
   void FillRecordset();
   int16_t MatchFile(const std::string& path, const xml::Node& f);
   bool UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask);
+  // The same for a drafted copy, with the same reports.
+  void UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files, const xml::Node& f,
+                          int16_t mask);
 
   int16_t RemoveIncompleteApplications(const std::string& id, int32_t highestSequence);
   void RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence);
@@ -97,6 +106,7 @@ class Compare : public Worker {
   int32_t lngDriveCounter = 0;
   int32_t lngFolderCounter = 0;
   std::string startTime_;  // formatted
+  xml::Node draftsFor_;    // the application whose version copies are drafted, if any
 
   // Every results copy of an application by a_id, so that pruning one application never scans
   // the whole results.

@@ -1,8 +1,12 @@
 #include "trl/compare.h"
 
+#include <optional>
+#include <unordered_set>
+
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
 #include "compare/local_file_index.h"
+#include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
 #include "frame/fixes.h"
@@ -127,10 +131,12 @@ bool Compare::MatchApplication(xml::Node a) {
   bool found = false;
   std::vector<xml::Node> versions;
   on([&] { versions = a.GetElementsByTagName(vocab::v); });
+  draftsFor_ = PrunedAfterwards(a, versions) ? a : xml::Node();
   for (const xml::Node& v : versions) {
     on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
     if (MatchVersion(v)) found = true;
   }
+  draftsFor_ = xml::Node();
   if (found) {
     int16_t remaining = 0;
     on([&] { remaining = RemoveIncompleteApplications(TextOf(a, vocab::a_id), highest); });
@@ -153,11 +159,31 @@ void Compare::RaiseApplicationProgress(xml::Node a, bool matched) {
   });
 }
 
+bool Compare::PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const {
+  // Its copies are pruned only when its a_id can be read and selected by; and a version copy is
+  // final once its version is matched only when no later version of the application shares its
+  // v_id (and so its copy).
+  std::optional<std::string> id = a.GetAttribute(vocab::a_id);
+  if (!id || id->find('\'') != std::string::npos || !objSchema) return false;
+  std::unordered_set<std::string> ids;
+  for (const xml::Node& v : versions) {
+    auto versionId = v.GetAttribute(vocab::v_id);
+    if (versionId && v.ParentNode() == a && !ids.insert(*versionId).second) return false;
+  }
+  return true;
+}
+
 bool Compare::MatchVersion(xml::Node v) {
   OnError on{kClass, compare::kMatchVersionLabel};
   bool found = false;
   std::vector<xml::Node> files;
   on([&] { files = v.GetElementsByTagName(vocab::f); });
+  // Copies of this version are drafted when the application's pruning follows for certain.
+  bool drafting = draftsFor_ && v.ParentNode() == draftsFor_;
+  std::optional<VersionFiles> shape;
+  std::vector<VersionDraft> drafts;
+  std::unordered_map<const void*, size_t> draftOf;  // by application copy; kNoDraft: made already
+  constexpr size_t kNoDraft = SIZE_MAX;
   // What a failed step would have produced keeps its value from the file or candidate before.
   std::string name, key, appFolder;
   int16_t mask = -1;
@@ -194,12 +220,47 @@ bool Compare::MatchVersion(xml::Node v) {
         aResult = Use(objSchema).AddApplication(v.ParentNode(), d);
         RememberCopy(aResult);
       });
+      found = true;
+      if (drafting && aResult) {
+        auto [at, added] = draftOf.try_emplace(aResult.Id(), drafts.size());
+        if (added) {
+          if (objResultsDOM->FindChild(aResult, vocab::v, vocab::v_id,
+                                       v.GetAttribute(vocab::v_id).value_or(""))) {
+            at->second = kNoDraft;
+          } else {
+            if (!shape) shape.emplace(files);
+            drafts.emplace_back(aResult, files.size());
+          }
+        }
+        if (at->second != kNoDraft) {
+          UpdateDraftDetails(drafts[at->second], *shape, f, mask);
+          continue;
+        }
+      }
       on([&] { vResult = Use(objSchema).AddVersion(v, aResult); });
       on([&] { UpdateFileDetails(vResult, f, mask); });
-      found = true;
     }
   }
+  for (const VersionDraft& draft : drafts) {
+    if (!draft.Incomplete(*shape)) MakeVersionCopy(v, draft);
+  }
   return found;
+}
+
+void Compare::MakeVersionCopy(const xml::Node& v, const VersionDraft& draft) {
+  OnError on{kClass, compare::kMatchVersionLabel};
+  xml::Node vResult;
+  if (!on([&] { vResult = Use(objSchema).AddVersion(v, draft.application); })) return;
+  // The copy holds one f per file of the version, in the same order.
+  std::vector<xml::Node> copies = vResult.ChildElements(vocab::f);
+  for (size_t i = 0; i < draft.found.size() && i < copies.size(); ++i) {
+    if (!draft.found[i]) continue;
+    copies[i].SetAttribute(vocab::p_max, std::to_string(draft.maxMask[i]));
+    copies[i].SetAttribute(vocab::p_act, std::to_string(draft.mask[i]));
+    copies[i].SetAttribute(vocab::f_exists, "1");
+  }
+  vResult.SetAttribute(vocab::f_act, std::to_string(draft.filesFound));
+  vResult.SetAttribute(vocab::v_act, std::to_string(draft.score));
 }
 
 std::string Compare::CandidatePath(const LocalFileRecord& record, const std::string& name) {

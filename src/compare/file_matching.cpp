@@ -3,6 +3,7 @@
 
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
+#include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
 #include "frame/use_object.h"
@@ -77,31 +78,68 @@ int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
   return mask;
 }
 
-bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask) {
-  OnError on{kClass, compare::kUpdateFileDetailsLabel};
+namespace {
+
+// What a find records from the fingerprint file; a value that cannot be read stays 0.
+struct FileDetails {
   int32_t id = 0;
   int16_t maxMask = 0, fileBit = 0;
-  on([&] { id = ToInt32(TextOf(f, vocab::f_id)); });
-  on([&] { maxMask = ToInt16(TextOf(f, vocab::p_max)); });
-  on([&] { fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
+};
+
+FileDetails ReadFileDetails(const OnError& on, const xml::Node& f) {
+  FileDetails details;
+  on([&] { details.id = ToInt32(TextOf(f, vocab::f_id)); });
+  on([&] { details.maxMask = ToInt16(TextOf(f, vocab::p_max)); });
+  on([&] { details.fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
+  return details;
+}
+
+}  // namespace
+
+bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask) {
+  OnError on{kClass, compare::kUpdateFileDetailsLabel};
+  FileDetails details = ReadFileDetails(on, f);
   xml::Node copy;
-  on([&] { copy = objResultsDOM->FindChild(vResult, vocab::f, vocab::f_id, std::to_string(id)); });
+  on([&] {
+    copy = objResultsDOM->FindChild(vResult, vocab::f, vocab::f_id, std::to_string(details.id));
+  });
   bool firstFind = false;
   on([&] { firstFind = TextOf(copy, vocab::f_exists) == "0"; });
   if (!firstFind) return true;
-  on([&] { copy.SetAttribute(vocab::p_max, std::to_string(maxMask)); });
+  on([&] { copy.SetAttribute(vocab::p_max, std::to_string(details.maxMask)); });
   on([&] { copy.SetAttribute(vocab::p_act, std::to_string(mask)); });
   on([&] { copy.SetAttribute(vocab::f_exists, "1"); });
   int32_t versionScore = 0, filesFound = 0;
   on([&] { versionScore = ToInt32(TextOf(vResult, vocab::v_act)); });
   on([&] { filesFound = ToInt32(TextOf(vResult, vocab::f_act)); });
   on([&] { vResult.SetAttribute(vocab::f_act, std::to_string(CheckedAdd(filesFound, 1))); });
-  if (maxMask == mask) {
+  if (details.maxMask == mask) {
     on([&] {
-      vResult.SetAttribute(vocab::v_act, std::to_string(CheckedAdd(versionScore, fileBit)));
+      vResult.SetAttribute(vocab::v_act, std::to_string(CheckedAdd(versionScore, details.fileBit)));
     });
   }
   return true;
+}
+
+void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files,
+                                 const xml::Node& f, int16_t mask) {
+  OnError on{kClass, compare::kUpdateFileDetailsLabel};
+  FileDetails details = ReadFileDetails(on, f);
+  auto at = files.byId.find(std::to_string(details.id));
+  if (at == files.byId.end()) {
+    // No copy of the file holds that id: reported as the read of the missing copy is.
+    on([&] { TextOf(xml::Node(), vocab::f_exists); });
+    return;
+  }
+  size_t i = at->second;
+  if (draft.found[i]) return;
+  draft.found[i] = true;
+  draft.maxMask[i] = details.maxMask;
+  draft.mask[i] = mask;
+  on([&] { draft.filesFound = CheckedAdd(draft.filesFound, 1); });
+  if (details.maxMask == mask) {
+    on([&] { draft.score = CheckedAdd(draft.score, details.fileBit); });
+  }
 }
 
 }  // namespace trl

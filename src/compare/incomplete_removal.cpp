@@ -4,6 +4,7 @@
 #include <tuple>
 
 #include "compare/compare_names.h"
+#include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
 #include "frame/vocabulary.h"
@@ -52,7 +53,11 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
       on([&] { filesFound = ToInt32(TextOf(v, vocab::f_act)); });
       if (filesFound >= filesMax) continue;
       size_t missing = 0;
-      on([&] { missing = v.CountNodes("./f[@f_exists='0' and @f_weight > 0]"); });
+      on([&] {
+        for (const xml::Node& f : v.ChildElements(vocab::f)) {
+          if (f.GetAttribute(vocab::f_exists) == "0" && CarriesWeight(f)) ++missing;
+        }
+      });
       // A version goes only when a file that carries weight was not found; the selection is then
       // made afresh.
       if (missing != 0 && on([&] { copy.RemoveChild(v); })) {
