@@ -121,8 +121,8 @@ bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t m
   return true;
 }
 
-void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files,
-                                 const xml::Node& f, int16_t mask) {
+void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files, const xml::Node& f,
+                                 int16_t mask) {
   OnError on{kClass, compare::kUpdateFileDetailsLabel};
   FileDetails details = ReadFileDetails(on, f);
   auto at = files.byId.find(std::to_string(details.id));

@@ -7,6 +7,7 @@
 #include <ctime>
 
 #include "compare/compare_fixture.h"
+#include "support/fault_injecting_file_system.h"
 
 namespace trl::testing {
 namespace {
@@ -85,6 +86,28 @@ TEST_F(CompareMatchTest, UnknownPropertyKindIsReportedByName) {
                                                             "trlLocator.Compare.MatchFile"}));
 }
 
+// A file tested for several versions is looked at and opened once; a failure to read it is
+// still reported at each test.
+TEST_F(CompareMatchTest, FileTestedForSeveralVersionsIsReadOnceAndFailsEachTime) {
+  tree_.AddFile("data.bin", "abc");
+  auto system = fs::CreatePosixFileSystem({});
+  auto faulty = std::make_unique<FaultInjectingFileSystem>(*system);
+  FaultInjectingFileSystem& faults = *faulty;
+  faults.FailOn(FaultInjectingFileSystem::Operation::kOpenFile, tree_.Path("data.bin"), 57);
+  std::string version = R"(<f f_id="1" f_name="data.bin" f_relpath="" f_weight="1">)"
+                        R"(<p p_type="2" p_weight="1" p_value="3"/>)"
+                        R"(<p p_type="3" p_weight="2" p_value="x"/></f></v>)";
+  Compare compare(std::move(faulty));
+  compare.Asynchronous(false);
+  auto results = Parse(compare.Start(nullptr, Parse(LocalFiles({{Folder(), {"data.bin"}}})),
+                                     Parse(R"(<fp><a a_id="1"><v v_id="1" v_seq="1">)" + version +
+                                           R"(<v v_id="2" v_seq="2">)" + version + "</a></fp>")));
+  EXPECT_THAT(ValuesOf(*results, "//a/v/f", "p_act"), ElementsAre("1", "1"));
+  EXPECT_THAT(EventNumbers(*results), ElementsAre(57, 57));
+  EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kFileExists), 1);
+  EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kOpenFile), 1);
+}
+
 TEST_F(CompareMatchTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFits) {
   for (const char* folder : {"local/Acme/bin", "share/Acme/bin", "local/Other"}) {
     tree_.AddFolder(folder);
@@ -138,6 +161,24 @@ TEST_F(CompareMatchTest, VersionsMissingAWeightedFileAreRemoved) {
   EXPECT_THAT(ValuesOf(*results, "//a", "a_max_seq"), ElementsAre("5"));
   EXPECT_THAT(ValuesOf(*results, "//a/v", "v_id"), ElementsAre("2"));
   EXPECT_THAT(ValuesOf(*results, "//a/v", "f_act"), ElementsAre("1"));
+}
+
+// Without pruning (no a_id to select by) an incomplete version stays; a later version with the
+// same v_id completes the copy the first one made.
+TEST_F(CompareMatchTest, IncompleteCopiesAreOnlyLeftOutWhenPruningWouldTakeThemOut) {
+  tree_.AddFile("a.exe");
+  tree_.AddFile("c.exe");
+  auto versions = [](const char* secondId) {
+    return R"(<v v_id="1" v_seq="1"><f f_id="1" f_name="a.exe" f_weight="1"/>)"
+           R"(<f f_id="2" f_name="b.dll" f_weight="1"/></v><v v_id=")" +
+           std::string(secondId) + R"(" v_seq="2"><f f_id="2" f_name="c.exe" f_weight="1"/></v>)";
+  };
+  std::string local = LocalFiles({{Folder(), {"a.exe", "c.exe"}}});
+  auto unnamed = Run("<fp><a a_name='no id'>" + versions("2") + "</a></fp>", local);
+  EXPECT_THAT(ValuesOf(*unnamed, "//a/v", "f_act"), ElementsAre("1", "1"));
+  auto shared = Run("<fp><a a_id='1'>" + versions("1") + "</a></fp>", local);
+  EXPECT_THAT(ValuesOf(*shared, "//a/v", "f_max"), ElementsAre("2"));
+  EXPECT_THAT(ValuesOf(*shared, "//a/v", "f_act"), ElementsAre("2"));
 }
 
 TEST_F(CompareMatchTest, EmptiedBranchesGoUpToTheComputerOnlyWhenItIsTheOnlyOne) {
