@@ -9,6 +9,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <string>
 
 #include "compare/local_file_index.h"
@@ -62,7 +63,7 @@ int main(int argc, char** argv) {
   double fill = Seconds(start);
   size_t indexBytes = HeapInUse() - before;
 
-  double best = 0;
+  double best = 0, bestCpu = 0;
   std::string results;
   for (int run = 0; run < runs; ++run) {
     // The run writes bit values into the fingerprint: each run gets a fresh copy.
@@ -71,9 +72,12 @@ int main(int argc, char** argv) {
     trl::Compare compare(trl::fs::CreatePosixFileSystem({}));
     compare.Asynchronous(false);
     start = Clock::now();
+    std::clock_t cpuStart = std::clock();
     results = compare.Start(nullptr, localFiles, fingerprint);
     double took = Seconds(start);
+    double cpu = static_cast<double>(std::clock() - cpuStart) / CLOCKS_PER_SEC;
     if (run == 0 || took < best) best = took;
+    if (run == 0 || cpu < bestCpu) bestCpu = cpu;
     trl::ReleaseSharedReporter();
   }
   if (argc > 3) {
@@ -88,9 +92,10 @@ int main(int argc, char** argv) {
   matches.LoadXml(results);
   std::printf(
       "records %zu  index %.1f B/record (fill %.3f s)  load local %.3f s  load fingerprint %.3f "
-      "s\ncompare best of %d: %.3f s  copies %zu  versions %zu  full versions %zu  events %zu\n",
+      "s\ncompare best of %d: %.3f s (cpu %.3f s)  copies %zu  versions %zu  full versions %zu  "
+      "events %zu\n",
       index.Size(), static_cast<double>(indexBytes) / static_cast<double>(index.Size()), fill,
-      loadLocal, loadFingerprint, runs, best, matches.AsNode().CountNodes("//d/a"),
+      loadLocal, loadFingerprint, runs, best, bestCpu, matches.AsNode().CountNodes("//d/a"),
       matches.AsNode().CountNodes("//a/v"), matches.AsNode().CountNodes("//a/v[@v_act=@v_max]"),
       matches.AsNode().CountNodes("//event"));
   return 0;

@@ -5,6 +5,7 @@
 
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
+#include "compare/folder_fit.h"
 #include "compare/local_file_index.h"
 #include "compare/version_draft.h"
 #include "frame/attributes.h"
@@ -194,9 +195,11 @@ bool Compare::MatchVersion(xml::Node v) {
     on([&] { key = Use(objSchema).EncodeName(name); });
     LocalFileIndex::Matches candidates;
     on([&] { candidates = Use(rsLocalFiles).Find(key); });
+    std::optional<FolderFit> fit;
     for (LocalFileRecord record : candidates) {
       YieldIfAsynchronous(on);
-      appFolder = FindCommonPath(f, record.Folder());
+      if (!fit) fit.emplace(f);
+      appFolder = fit->AppFolder(record.Folder());
       if (!appFolder.empty()) {
         std::string path = CandidatePath(record, name);
         on([&] { mask = MatchFile(path, f); });

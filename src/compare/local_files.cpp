@@ -5,6 +5,7 @@
 #include <new>
 
 #include "compare/compare_names.h"
+#include "compare/folder_fit.h"
 #include "compare/local_file_index.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
@@ -67,21 +68,7 @@ void Compare::FillRecordset() {
 }
 
 std::string Compare::FindCommonPath(const xml::Node& f, std::string folder) {
-  OnError on{kClass, compare::kFindCommonPathLabel};
-  std::string rel;
-  on([&] { rel = LowerCase(TextOf(f, vocab::f_relpath)); });
-  if (rel.empty()) return folder;
-  if (!rel.ends_with('\\')) rel += '\\';
-  // Lengths in bytes decide as lengths in characters would: every later test compares whole texts.
-  if (folder.size() < rel.size()) return "";
-  if (!folder.ends_with('\\')) folder += '\\';
-  bool fullPath = false;
-  on([&] { fullPath = f.GetAttribute(vocab::f_fullpath) == "True"; });
-  if (fullPath) return folder == rel ? rel : "";
-  if (!rel.starts_with('\\')) rel.insert(rel.begin(), '\\');
-  if (!folder.ends_with(rel)) return "";
-  folder.resize(folder.size() - (rel.size() - 1));
-  return folder;
+  return FolderFit(f).AppFolder(folder);
 }
 
 }  // namespace trl
