@@ -37,7 +37,10 @@ trl::xml::DocumentPtr Load(const std::string& path) {
   return document;
 }
 
-size_t HeapInUse() { return mallinfo2().uordblks; }
+size_t HeapInUse() {
+  struct mallinfo2 info = mallinfo2();
+  return info.uordblks + info.hblkhd;  // large blocks are mapped apart
+}
 
 }  // namespace
 

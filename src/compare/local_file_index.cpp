@@ -1,6 +1,8 @@
 #include "compare/local_file_index.h"
 
-#include <cstring>
+#include <algorithm>
+#include <functional>
+#include <utility>
 
 #include "platform/failure.h"
 #include "platform/text.h"
@@ -43,13 +45,11 @@ const std::string& LocalFileRecord::EncodedFolder() const {
 }
 
 std::string_view LocalFileRecord::Filename() const {
-  const auto& record = index_->records_[record_];
-  if (record.filename == LocalFileIndex::kNone) return *record.encodedFilename;
-  return {index_->names_.data() + record.filename};
+  return index_->NameAt(index_->records_[record_].filename);
 }
 
 std::string_view LocalFileRecord::EncodedFilename() const {
-  return *index_->records_[record_].encodedFilename;
+  return index_->NameAt(index_->records_[record_].encodedFilename);
 }
 
 std::string LocalFileRecord::FullPath() const {
@@ -87,29 +87,68 @@ void LocalFileIndex::AddFolder(std::string folder, std::string encodedFolder) {
 void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
                              std::string_view encodedFilename) {
   if (folders_.empty()) AddFolder("", "");
-  // Record numbers and name offsets are 32-bit; kNone stays free as the end mark.
-  if (records_.size() >= kNone - 1 || names_.size() + filename.size() >= kNone - 1) {
-    Fail(kOutOfMemory);
-  }
+  std::string key = LowerCase(encodedFilename);
+  if (records_.size() >= kNone - 1) Fail(kOutOfMemory);
+  if (2 * (keys_ + 1) > slots_.size()) Grow();
   // Room first, so that a failing allocation leaves no chain pointing past the records.
   if (records_.size() == records_.capacity()) records_.reserve(records_.size() * 2 + 64);
-  auto record = static_cast<uint32_t>(records_.size());
-  auto [entry, added] = byName_.try_emplace(LowerCase(encodedFilename), Chain{record, record});
-  if (!added) records_[entry->second.last].next = record;
-  entry->second.last = record;
+  uint32_t encodedAt = AddName(key);
+  uint32_t filenameAt = filename == key ? encodedAt : AddName(filename);
 
-  Record& stored = records_.emplace_back(
-      Record{fileId, static_cast<uint32_t>(folders_.size() - 1), kNone, kNone, &entry->first});
-  if (filename != entry->first) {
-    stored.filename = static_cast<uint32_t>(names_.size());
-    names_.append(filename);
-    names_.push_back('\0');
+  auto record = static_cast<uint32_t>(records_.size());
+  uint32_t hash = Hash(key);
+  Slot& slot = slots_[Probe(key, hash)];
+  if (slot.first == kNone) {
+    slot = {hash, record, record};
+    ++keys_;
+  } else {
+    records_[slot.last].next = record;
+    slot.last = record;
   }
+  records_.push_back(
+      {fileId, static_cast<uint32_t>(folders_.size() - 1), kNone, encodedAt, filenameAt});
 }
 
 LocalFileIndex::Matches LocalFileIndex::Find(std::string_view key) const {
-  auto found = byName_.find(LowerCase(key));
-  return {this, found == byName_.end() ? kNone : found->second.first};
+  if (slots_.empty()) return {};
+  std::string lower = LowerCase(key);
+  return {this, slots_[Probe(lower, Hash(lower))].first};
+}
+
+uint32_t LocalFileIndex::Hash(std::string_view key) {
+  return static_cast<uint32_t>(std::hash<std::string_view>{}(key));
+}
+
+std::string_view LocalFileIndex::NameAt(uint32_t offset) const { return {names_.data() + offset}; }
+
+size_t LocalFileIndex::Probe(std::string_view key, uint32_t hash) const {
+  size_t mask = slots_.size() - 1;
+  for (size_t at = hash & mask;; at = (at + 1) & mask) {
+    const Slot& slot = slots_[at];
+    if (slot.first == kNone) return at;
+    if (slot.hash == hash && NameAt(records_[slot.first].encodedFilename) == key) return at;
+  }
+}
+
+void LocalFileIndex::Grow() {
+  size_t size = std::max<size_t>(64, 2 * slots_.size());
+  std::vector<Slot> old = std::exchange(slots_, std::vector<Slot>(size));
+  size_t mask = slots_.size() - 1;
+  for (const Slot& slot : old) {
+    if (slot.first == kNone) continue;
+    size_t at = slot.hash & mask;
+    while (slots_[at].first != kNone) at = (at + 1) & mask;
+    slots_[at] = slot;
+  }
+}
+
+uint32_t LocalFileIndex::AddName(std::string_view name) {
+  // Offsets are 32-bit.
+  if (names_.size() + name.size() + 1 >= kNone) Fail(kOutOfMemory);
+  auto at = static_cast<uint32_t>(names_.size());
+  names_.append(name);
+  names_.push_back('\0');
+  return at;
 }
 
 }  // namespace trl

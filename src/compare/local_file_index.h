@@ -3,7 +3,6 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
-#include <unordered_map>
 #include <vector>
 
 namespace trl {
@@ -98,26 +97,35 @@ class LocalFileIndex {
     std::string folder, encodedFolder;
     uint32_t drive;
   };
-  struct Chain {
-    uint32_t first, last;
-  };
-  // 24 bytes. The encoded name is the key the record hangs under; the plain name is kept only where
-  // it differs from the encoded one (in `names_`, at `filename`).
+  // 20 bytes; the names are in `names_`, each followed by '\0'. The plain name shares the encoded
+  // one's text when they are equal, as they mostly are.
   struct Record {
     int32_t fileId;
     uint32_t folder;
     uint32_t next;  // the next record under the same key
-    uint32_t filename = kNone;
-    const std::string* encodedFilename;
+    uint32_t encodedFilename;
+    uint32_t filename;
+  };
+  // One key of the open-addressing table: the first and last records under it. 12 bytes.
+  struct Slot {
+    uint32_t hash;
+    uint32_t first = kNone;
+    uint32_t last = kNone;
   };
 
-  void EnsureFolder();
+  static uint32_t Hash(std::string_view key);
+  std::string_view NameAt(uint32_t offset) const;
+  // The slot holding `key`, or the empty slot where it would go.
+  size_t Probe(std::string_view key, uint32_t hash) const;
+  void Grow();
+  uint32_t AddName(std::string_view name);
 
   std::vector<DriveEntry> drives_;
   std::vector<FolderEntry> folders_;
   std::vector<Record> records_;
-  std::string names_;  // plain names that differ from their encoded form, each followed by '\0'
-  std::unordered_map<std::string, Chain> byName_;
+  std::string names_;
+  std::vector<Slot> slots_;  // a power of two in size, at most half full
+  size_t keys_ = 0;
 };
 
 }  // namespace trl
