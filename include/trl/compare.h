@@ -13,6 +13,7 @@
 namespace trl {
 
 class LocalFileIndex;
+class FingerprintFile;
 struct LocalFileFacts;
 struct VersionDraft;
 struct VersionFiles;
@@ -75,10 +76,10 @@ class Compare : public Worker {
   static std::string CandidatePath(const LocalFileRecord& record, const std::string& name);
 
   void FillRecordset();
-  int16_t MatchFile(const std::string& path, const xml::Node& f);
-  bool UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask);
+  int16_t MatchFile(const std::string& path, const FingerprintFile& f);
+  bool UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int16_t mask);
   // The same for a drafted copy, with the same reports.
-  void UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files, const xml::Node& f,
+  void UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files, const FingerprintFile& f,
                           int16_t mask);
 
   int16_t RemoveIncompleteApplications(const std::string& id, int32_t highestSequence);

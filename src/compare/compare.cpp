@@ -5,7 +5,7 @@
 
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
-#include "compare/folder_fit.h"
+#include "compare/fingerprint_file.h"
 #include "compare/local_file_index.h"
 #include "compare/version_draft.h"
 #include "frame/attributes.h"
@@ -195,14 +195,14 @@ bool Compare::MatchVersion(xml::Node v) {
     on([&] { key = Use(objSchema).EncodeName(name); });
     LocalFileIndex::Matches candidates;
     on([&] { candidates = Use(rsLocalFiles).Find(key); });
-    std::optional<FolderFit> fit;
+    std::optional<FingerprintFile> file;
     for (LocalFileRecord record : candidates) {
       YieldIfAsynchronous(on);
-      if (!fit) fit.emplace(f);
-      appFolder = fit->AppFolder(record.Folder());
+      if (!file) file.emplace(f);
+      appFolder = file->Fit().AppFolder(record.Folder());
       if (!appFolder.empty()) {
         std::string path = CandidatePath(record, name);
-        on([&] { mask = MatchFile(path, f); });
+        on([&] { mask = MatchFile(path, *file); });
       } else {
         mask = -1;
       }
@@ -236,12 +236,12 @@ bool Compare::MatchVersion(xml::Node v) {
           }
         }
         if (at->second != kNoDraft) {
-          UpdateDraftDetails(drafts[at->second], *shape, f, mask);
+          UpdateDraftDetails(drafts[at->second], *shape, *file, mask);
           continue;
         }
       }
       on([&] { vResult = Use(objSchema).AddVersion(v, aResult); });
-      on([&] { UpdateFileDetails(vResult, f, mask); });
+      on([&] { UpdateFileDetails(vResult, *file, mask); });
     }
   }
   for (const VersionDraft& draft : drafts) {

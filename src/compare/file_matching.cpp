@@ -1,8 +1,8 @@
 // Scoring one local file against a fingerprint file, and recording the find in the results.
-#include <cmath>
 
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
+#include "compare/fingerprint_file.h"
 #include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
@@ -48,7 +48,7 @@ bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File* file, Lo
 
 }  // namespace
 
-int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
+int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
   OnError on{kClass, compare::kMatchFileLabel};
   int16_t mask = 0;
   auto& seen = filesSeen_[path];
@@ -61,44 +61,22 @@ int16_t Compare::MatchFile(const std::string& path, const xml::Node& f) {
   }
   const fs::File* file = nullptr;
   on([&] { file = facts.file.Get([&] { return objFSO->GetFile(path); }).get(); });
-  std::vector<xml::Node> properties;
-  on([&] { properties = f.GetElementsByTagName(vocab::p); });
-  // A value that cannot be read keeps what the property before gave.
-  int16_t kind = 0, weight = 0, bit = 0;
-  for (const xml::Node& p : properties) {
-    on([&] { kind = ToInt16(TextOf(p, vocab::p_type)); });
-    on([&] { weight = ToInt16(TextOf(p, vocab::p_weight)); });
-    on([&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
+  for (const FingerprintFile::Property& property : f.Properties()) {
+    for (const auto& failure : property.readFailures) FingerprintFile::Replay(on, failure);
     bool agrees = false;
     on([&] {
-      agrees = PropertyAgrees(kind, Use(objSchema), file, facts, TextOf(p, vocab::p_value));
+      if (property.expectedFailure) std::rethrow_exception(property.expectedFailure);
+      agrees = PropertyAgrees(property.kind, Use(objSchema), file, facts, property.expected);
     });
-    if (agrees) on([&] { mask = CheckedAdd16(mask, bit); });
+    if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });
   }
   return mask;
 }
 
-namespace {
-
-// What a find records from the fingerprint file; a value that cannot be read stays 0.
-struct FileDetails {
-  int32_t id = 0;
-  int16_t maxMask = 0, fileBit = 0;
-};
-
-FileDetails ReadFileDetails(const OnError& on, const xml::Node& f) {
-  FileDetails details;
-  on([&] { details.id = ToInt32(TextOf(f, vocab::f_id)); });
-  on([&] { details.maxMask = ToInt16(TextOf(f, vocab::p_max)); });
-  on([&] { details.fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
-  return details;
-}
-
-}  // namespace
-
-bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t mask) {
+bool Compare::UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int16_t mask) {
   OnError on{kClass, compare::kUpdateFileDetailsLabel};
-  FileDetails details = ReadFileDetails(on, f);
+  const FingerprintFile::Details& details = f.FindDetails();
+  for (const auto& failure : details.readFailures) FingerprintFile::Replay(on, failure);
   xml::Node copy;
   on([&] {
     copy = objResultsDOM->FindChild(vResult, vocab::f, vocab::f_id, std::to_string(details.id));
@@ -121,10 +99,11 @@ bool Compare::UpdateFileDetails(xml::Node vResult, const xml::Node& f, int16_t m
   return true;
 }
 
-void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files, const xml::Node& f,
-                                 int16_t mask) {
+void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files,
+                                 const FingerprintFile& f, int16_t mask) {
   OnError on{kClass, compare::kUpdateFileDetailsLabel};
-  FileDetails details = ReadFileDetails(on, f);
+  const FingerprintFile::Details& details = f.FindDetails();
+  for (const auto& failure : details.readFailures) FingerprintFile::Replay(on, failure);
   auto at = files.byId.find(std::to_string(details.id));
   if (at == files.byId.end()) {
     // No copy of the file holds that id: reported as the read of the missing copy is.

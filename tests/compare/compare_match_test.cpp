@@ -108,6 +108,26 @@ TEST_F(CompareMatchTest, FileTestedForSeveralVersionsIsReadOnceAndFailsEachTime)
   EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kOpenFile), 1);
 }
 
+// A fingerprint file is read once for all its candidates, but what cannot be read is reported at
+// each candidate, in the order a fresh read would report it.
+TEST_F(CompareMatchTest, UnreadableFingerprintValuesAreReportedAtEachCandidate) {
+  tree_.AddFolder("two");
+  tree_.AddFile("data.bin", "abc");
+  tree_.AddFile("two/data.bin", "abc");
+  auto results = Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_name="data.bin" f_weight="1">)"
+                     R"(<p p_type="2" p_weight="x" p_value="3"/></f></v></a></fp>)",
+                     LocalFiles({{Folder(), {"data.bin"}}, {Folder("two"), {"data.bin"}}}));
+  std::vector<std::string> where;
+  for (const ReportedEvent& event : EventsIn(*results)) {
+    where.push_back(event.procedure + " " + std::to_string(event.number));
+  }
+  // Without an f_id the find reaches no copy of the file (91).
+  EXPECT_THAT(where,
+              ElementsAre("UpgradeFingerprintData 13", "FindCommonPath 94", "MatchFile 13",
+                          "UpdateFileDetails 94", "UpdateFileDetails 91", "FindCommonPath 94",
+                          "MatchFile 13", "UpdateFileDetails 94", "UpdateFileDetails 91"));
+}
+
 TEST_F(CompareMatchTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFits) {
   for (const char* folder : {"local/Acme/bin", "share/Acme/bin", "local/Other"}) {
     tree_.AddFolder(folder);

@@ -1,0 +1,47 @@
+#include "compare/fingerprint_file.h"
+
+#include <cmath>
+
+#include "frame/attributes.h"
+#include "frame/vocabulary.h"
+#include "platform/convert.h"
+
+namespace trl {
+namespace {
+
+// Runs `read`; its failure is added to `failures` instead of leaving.
+template <class Read>
+void Try(std::vector<std::exception_ptr>& failures, Read read) {
+  try {
+    read();
+  } catch (...) {
+    failures.push_back(std::current_exception());
+  }
+}
+
+}  // namespace
+
+FingerprintFile::FingerprintFile(const xml::Node& f) : f_(f), fit_(f) {
+  std::vector<xml::Node> properties = f.GetElementsByTagName(vocab::p);
+  properties_.reserve(properties.size());
+  int16_t kind = 0, weight = 0, bit = 0;
+  for (const xml::Node& p : properties) {
+    Property& property = properties_.emplace_back();
+    Try(property.readFailures, [&] { kind = ToInt16(TextOf(p, vocab::p_type)); });
+    Try(property.readFailures, [&] { weight = ToInt16(TextOf(p, vocab::p_weight)); });
+    Try(property.readFailures, [&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
+    property.kind = kind;
+    property.bit = bit;
+    try {
+      property.expected = TextOf(p, vocab::p_value);
+    } catch (...) {
+      property.expectedFailure = std::current_exception();
+    }
+  }
+  Details& details = details_;
+  Try(details.readFailures, [&] { details.id = ToInt32(TextOf(f, vocab::f_id)); });
+  Try(details.readFailures, [&] { details.maxMask = ToInt16(TextOf(f, vocab::p_max)); });
+  Try(details.readFailures, [&] { details.fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
+}
+
+}  // namespace trl
