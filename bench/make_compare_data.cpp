@@ -30,6 +30,8 @@
 #include <utility>
 #include <vector>
 
+#include "rng.h"
+
 namespace {
 
 namespace fs = std::filesystem;
@@ -39,33 +41,11 @@ constexpr int kFilesPerVersion = 20;
 constexpr size_t kInstallEvery = 20;
 constexpr uint64_t kRandomStart = 20260101;
 
-// Own generator and draws rather than <random> distributions, whose output differs between
-// standard libraries; the data must be the same wherever it is built.
-class Rng {
- public:
-  explicit Rng(uint64_t start) : state_(start) {}
-
-  uint64_t Next() {  // splitmix64
-    uint64_t z = (state_ += 0x9E3779B97F4A7C15ULL);
-    z = (z ^ (z >> 30)) * 0xBF58476D1CE4E5B9ULL;
-    z = (z ^ (z >> 27)) * 0x94D049BB133111EBULL;
-    return z ^ (z >> 31);
-  }
-  size_t Below(size_t n) { return static_cast<size_t>(Next() % n); }
-  bool Chance(int percent) { return Below(100) < static_cast<size_t>(percent); }
-
-  template <size_t N>
-  std::string_view Pick(const std::array<std::string_view, N>& words) {
-    return words[Below(N)];
-  }
-
- private:
-  uint64_t state_;
-};
+using trl::bench::Rng;
 
 // A start for an Rng of its own per item, so an item's data does not depend on the order or the
 // number of other items drawn before it.
-uint64_t Seed(uint64_t a, uint64_t b, uint64_t c = 0) {
+uint64_t StartFor(uint64_t a, uint64_t b, uint64_t c = 0) {
   Rng rng(kRandomStart ^ a);
   Rng second(rng.Next() ^ b);
   Rng third(second.Next() ^ c);
@@ -330,7 +310,7 @@ std::vector<App> PlanApps(size_t count) {
   std::unordered_set<std::string> folders;
   for (size_t i = 0; i < count; ++i) {
     const size_t number = i + 1;
-    Rng rng(Seed(1, number));
+    Rng rng(StartFor(1, number));
     App& app = apps[i];
     const std::string_view brand = rng.Pick(kBrands);
     const std::string_view product = rng.Pick(kProducts);
@@ -388,7 +368,7 @@ std::vector<App> PlanApps(size_t count) {
 // The content of file `f` (0-based) of version `version` (1-based) of application `number`.
 void Content(size_t number, int version, size_t f, uint32_t size, std::vector<uint8_t>& out) {
   out.resize(size);
-  Rng rng(Seed(number, static_cast<uint64_t>(version), f + 1));
+  Rng rng(StartFor(number, static_cast<uint64_t>(version), f + 1));
   // Byte by byte rather than memcpy, so the content does not depend on the host's byte order.
   for (size_t at = 0; at < size; at += 8) {
     const uint64_t word = rng.Next();
@@ -549,7 +529,7 @@ struct LocalFolder {
   std::string relpath;  // of the application's files placed here, for kInstalled and kFitting
   size_t files = 0;
   size_t fitting = 0;  // fingerprint names that fit this folder, for kFitting
-  uint64_t seed = 0;
+  uint64_t start = 0;
 };
 
 // A product folder name of software that is not in the fingerprint, like "Render Host 3".
@@ -674,13 +654,13 @@ class LocalFilesWriter {
 
     // Every 10th filler folder holds 1 to 3 fingerprint names that fit it; with about 20 files a
     // folder that makes about 1% of the filler.
-    Rng rng(Seed(2, 0));
+    Rng rng(StartFor(2, 0));
     size_t left = localFiles_ - installedFiles;
     for (size_t n = 0; left > 0; ++n) {
       LocalFolder folder;
       folder.files = std::min(left, 10 + rng.Below(21));
       left -= folder.files;
-      folder.seed = rng.Next();
+      folder.start = rng.Next();
       std::string text;
       if (n % 10 == 9) {
         size_t app;
@@ -743,7 +723,7 @@ class LocalFilesWriter {
       return;
     }
 
-    Rng rng(folder.seed);
+    Rng rng(folder.start);
     if (folder.kind == LocalFolder::Kind::kFitting) {
       std::vector<size_t> candidates;
       for (size_t f = 0; f < app.files.size(); ++f) {

@@ -1,0 +1,36 @@
+#!/usr/bin/env bash
+# Times the compare stage at 10% and 100% of a fingerprint of 10,000 applications x 5 versions x
+# 20 files against a local-files document of 1,000,000 files, 5% of the applications installed.
+#
+# usage: bench/compare_scale.sh [BUILD_DIR] [WORK_DIR]
+#   BUILD_DIR  configured build folder holding bench/make_compare_data and bench/compare_bench
+#              (default: build)
+#   WORK_DIR   where the data sets go (default: /tmp/trl-compare-bench); kept between runs
+#   RUNS       environment: runs per scale, the best counts (default: 5)
+set -euo pipefail
+
+build_dir=$(realpath -m "${1:-build}")
+work_dir=$(realpath -m "${2:-/tmp/trl-compare-bench}")
+runs=${RUNS:-5}
+for tool in make_compare_data compare_bench; do
+  [[ -x $build_dir/bench/$tool ]] || {
+    echo "missing $build_dir/bench/$tool: cmake --build $build_dir --target $tool" >&2
+    exit 1
+  }
+done
+
+declare -A seconds
+for apps in 1000 10000; do
+  data="$work_dir/apps-$apps"
+  if [[ ! -f $data.done ]]; then
+    rm -rf "$data"
+    "$build_dir/bench/make_compare_data" "$data" "$apps" >/dev/null
+    touch "$data.done"
+  fi
+  echo "== $apps applications, $((apps * 100)) local files"
+  report=$("$build_dir/bench/compare_bench" "$data" "$runs")
+  echo "$report"
+  seconds[$apps]=$(sed -n 's/^compare best of [0-9]*: \([0-9.]*\) s.*/\1/p' <<<"$report")
+done
+awk -v a="${seconds[1000]}" -v b="${seconds[10000]}" \
+  'BEGIN { printf "10x the input took %.1fx the time\n", b / a }'
