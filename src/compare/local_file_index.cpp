@@ -8,6 +8,19 @@
 #include "platform/text.h"
 
 namespace trl {
+namespace {
+
+// The key as the index holds it: lower-cased, without a copy when it is lower-case ASCII already.
+std::string_view Key(std::string_view name, std::string& lowered) {
+  bool plain = std::all_of(name.begin(), name.end(), [](char c) {
+    return static_cast<unsigned char>(c) < 0x80 && !(c >= 'A' && c <= 'Z');
+  });
+  if (plain) return name;
+  lowered = LowerCase(name);
+  return lowered;
+}
+
+}  // namespace
 
 int32_t LocalFileRecord::FileID() const { return index_->records_[record_].fileId; }
 
@@ -87,7 +100,8 @@ void LocalFileIndex::AddFolder(std::string folder, std::string encodedFolder) {
 void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
                              std::string_view encodedFilename) {
   if (folders_.empty()) AddFolder("", "");
-  std::string key = LowerCase(encodedFilename);
+  std::string lowered;
+  std::string_view key = Key(encodedFilename, lowered);
   if (records_.size() >= kNone - 1) Fail(kOutOfMemory);
   if (2 * (keys_ + 1) > slots_.size()) Grow();
   // Room first, so that a failing allocation leaves no chain pointing past the records.
@@ -111,8 +125,9 @@ void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
 
 LocalFileIndex::Matches LocalFileIndex::Find(std::string_view key) const {
   if (slots_.empty()) return {};
-  std::string lower = LowerCase(key);
-  return {this, slots_[Probe(lower, Hash(lower))].first};
+  std::string lowered;
+  std::string_view lookup = Key(key, lowered);
+  return {this, slots_[Probe(lookup, Hash(lookup))].first};
 }
 
 uint32_t LocalFileIndex::Hash(std::string_view key) {
