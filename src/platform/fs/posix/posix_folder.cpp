@@ -11,7 +11,7 @@ std::string PosixFolder::Name() const { return NameFromNative(nativeName_); }
 uint16_t PosixFolder::Attributes(uint16_t wanted) const {
   // A folder (or a link to one) is never a system item.
   return ItemAttributes(
-      *place_, place_->Native(), nativeName_, wanted, [] { return false; },
+      *place_, [this] { return place_->Native(); }, nativeName_, wanted, [] { return false; },
       [this] { return Status().mode; });
 }
 
