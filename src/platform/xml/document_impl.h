@@ -62,6 +62,11 @@ struct Document::Impl {
   // so a failure changes nothing.
   pugi::xml_node Place(pugi::xml_node parent, const Node& child, pugi::xml_node before,
                        pugi::xml_node replacing);
+  // A new `tag` element with `attributes`, appended to the element `parent` (see
+  // Node::AppendElement).
+  pugi::xml_node AppendElement(
+      pugi::xml_node parent, std::string_view tag,
+      std::initializer_list<std::pair<std::string_view, std::string_view>> attributes);
   // Removes `node` from its parent and frees it with everything below.
   void Destroy(pugi::xml_node node);
   void Changed() { ++modifications; }

@@ -179,6 +179,15 @@ Node Node::AppendChild(Node child) {
   return impl.Wrap(impl.Place(node, child, pugi::xml_node(), pugi::xml_node()));
 }
 
+Node Node::AppendElement(
+    std::string_view tag,
+    std::initializer_list<std::pair<std::string_view, std::string_view>> attributes) {
+  pugi::xml_node node = Require(*this);
+  if (node.type() != pugi::node_element) Fail(kInvalidArgument, "Only elements take new elements");
+  Document::Impl& impl = *document_->impl_;
+  return impl.Wrap(impl.AppendElement(node, tag, attributes));
+}
+
 Node Node::InsertBefore(Node child, Node reference) {
   if (reference.IsNull()) return AppendChild(child);
   pugi::xml_node node = Require(*this);
