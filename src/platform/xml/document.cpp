@@ -54,6 +54,7 @@ void Document::Impl::Reset(ParseError error) {
   pool = pugi::xml_node();
   tagPrototypes.clear();
   attributePrototypes.clear();
+  recentPrototypes = {};
   doc.reset();
   parseError = std::move(error);
   Changed();
@@ -86,6 +87,18 @@ pugi::xml_node Document::Impl::NamePool() {
 }
 
 pugi::xml_node Document::Impl::Prototype(std::string_view name, bool attribute) {
+  size_t slot = (name.size() * 7 + (name.empty() ? 0 : name.back()) + (attribute ? 1 : 0)) %
+                recentPrototypes.size();
+  RecentPrototype& recent = recentPrototypes[slot];
+  if (recent.prototype && recent.attribute == attribute && recent.name == name) {
+    return recent.prototype;
+  }
+  pugi::xml_node prototype = FindOrAddPrototype(name, attribute);
+  recent = {std::string(name), attribute, prototype};
+  return prototype;
+}
+
+pugi::xml_node Document::Impl::FindOrAddPrototype(std::string_view name, bool attribute) {
   auto& prototypes = attribute ? attributePrototypes : tagPrototypes;
   auto found = prototypes.find(name);
   if (found != prototypes.end()) return found->second;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <pugixml.hpp>
 #include <string>
@@ -85,6 +86,7 @@ struct Document::Impl {
   // and copies of a parsed node point to that buffer instead of copying the text.
   pugi::xml_node NamePool();
   pugi::xml_node Prototype(std::string_view name, bool attribute);
+  pugi::xml_node FindOrAddPrototype(std::string_view name, bool attribute);
   pugi::xml_node pool;
   // Looked up by string_view, without making a string.
   struct NameHash {
@@ -94,6 +96,14 @@ struct Document::Impl {
   using Prototypes = std::unordered_map<std::string, pugi::xml_node, NameHash, std::equal_to<>>;
   Prototypes tagPrototypes;
   Prototypes attributePrototypes;
+  // The names last used, by length and last letter: a new element of a kind made a million times
+  // then finds its few names without hashing them.
+  struct RecentPrototype {
+    std::string name;
+    bool attribute = false;
+    pugi::xml_node prototype;
+  };
+  std::array<RecentPrototype, 16> recentPrototypes;
 
   void CheckPlacement(pugi::xml_node parent, pugi::xml_node child, pugi::xml_node replacing) const;
 };
