@@ -13,7 +13,7 @@ namespace trl::xml {
 // only touched by that copy, and gives each block back as soon as it is copied.
 class TextBuilder final : public pugi::xml_writer {
  public:
-  explicit TextBuilder(size_t startSize = 64 << 10, size_t blockSize = 4 << 20)
+  explicit TextBuilder(size_t startSize = 64 << 10, size_t blockSize = 256 << 10)
       : startSize_(startSize), blockSize_(blockSize) {}
   ~TextBuilder() override;
   TextBuilder(const TextBuilder&) = delete;
