@@ -41,6 +41,11 @@ FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder)
   }
 }
 
+void ListingReadAhead::Recycle(Collection<File> files) {
+  std::lock_guard lock(mutex_);
+  if (reader_.joinable()) toFree_.push_back(std::move(files));
+}
+
 void ListingReadAhead::ReadNext(const std::shared_ptr<FolderPlace>& folder) {
   // Everything ready comes before `folder` in walk order, or belongs to a walk left behind.
   DropReady(ready_.end());
@@ -90,7 +95,10 @@ void ListingReadAhead::Run() {
     toRead_.pop_back();
     reading_ = folder;
     readingDropped_ = false;
+    std::vector<Collection<File>> toFree;
+    toFree.swap(toFree_);
     lock.unlock();
+    toFree.clear();
     std::optional<FolderListing> listing;
     try {
       listing = ListFolder(folder);

@@ -6,6 +6,10 @@
 
 namespace trl::fs::posix {
 
+PosixFolder::~PosixFolder() {
+  if (readAhead_ && !files_.empty()) readAhead_->Recycle(std::move(files_));
+}
+
 std::string PosixFolder::Name() const { return NameFromNative(nativeName_); }
 
 uint16_t PosixFolder::Attributes(uint16_t wanted) const {

@@ -28,6 +28,9 @@ class PosixFolder final : public Folder {
         status_(status),
         memory_(std::move(memory)),
         readAhead_(std::move(readAhead)) {}
+  ~PosixFolder() override;
+  PosixFolder(const PosixFolder&) = delete;
+  PosixFolder& operator=(const PosixFolder&) = delete;
 
   std::string Name() const override;
   std::string Path() const override { return place_->Path(); }
