@@ -26,6 +26,17 @@ void AppendUtf8(std::string& out, char32_t cp) {
   out.append(reinterpret_cast<const char*>(buffer), static_cast<size_t>(n));
 }
 
+// The length of the leading run of ASCII bytes that `keep`.
+template <class Keep>
+size_t AsciiPrefix(std::string_view text, Keep keep) {
+  size_t i = 0;
+  while (i < text.size() && static_cast<unsigned char>(text[i]) < 0x80 &&
+         keep(static_cast<unsigned char>(text[i]))) {
+    ++i;
+  }
+  return i;
+}
+
 bool IsXmlChar(char32_t cp) {
   if (cp < 0x20) return cp == 0x09 || cp == 0x0A || cp == 0x0D;
   if (cp >= 0xD800 && cp <= 0xDFFF) return false;
@@ -43,9 +54,12 @@ bool NeedsEscape(char32_t cp) {
 }  // namespace
 
 std::string LowerCase(std::string_view text) {
-  std::string out;
+  // Names are mostly ASCII: that part is copied and lowered in place, without a test per append.
+  size_t i = AsciiPrefix(text, [](unsigned char) { return true; });
+  std::string out(text.substr(0, i));
+  for (char& c : out) c = static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c);
+  if (i == text.size()) return out;
   out.reserve(text.size());
-  size_t i = 0;
   while (i < text.size()) {
     auto byte = static_cast<unsigned char>(text[i]);
     if (byte < 0x80) {
@@ -81,7 +95,8 @@ bool IsValidUtf8(std::string_view text) {
 }
 
 bool IsXmlSafe(std::string_view text) {
-  for (size_t i = 0; i < text.size();) {
+  for (size_t i = AsciiPrefix(text, [](unsigned char byte) { return byte >= 0x20; });
+       i < text.size();) {
     auto byte = static_cast<unsigned char>(text[i]);
     if (byte < 0x80) {
       if (!IsXmlChar(byte)) return false;
@@ -97,9 +112,11 @@ bool IsXmlSafe(std::string_view text) {
 }
 
 std::string NameFromNative(std::string_view bytes) {
-  std::string out;
+  size_t i = AsciiPrefix(bytes, [](unsigned char byte) { return byte >= 0x20 && byte != '\\'; });
+  std::string out(bytes.substr(0, i));
+  if (i == bytes.size()) return out;
   out.reserve(bytes.size());
-  for (size_t i = 0; i < bytes.size();) {
+  while (i < bytes.size()) {
     auto byte = static_cast<unsigned char>(bytes[i]);
     if (byte >= 0x20 && byte < 0x80 && byte != '\\') {
       out.push_back(static_cast<char>(byte));

@@ -102,15 +102,15 @@ struct Schema::Impl {
     xml::Document& document = parent.OwnerDocument();
     if (xml::Node found = document.FindChild(parent, level.tag, level.name, name)) return found;
     if (counter == std::numeric_limits<int32_t>::max()) Fail(kOverflow);
-    // Refused before anything is created, so that a failure leaves no detached element behind.
-    if (!IsXmlSafe(text) || !IsXmlSafe(name)) Fail(kInvalidArgument);
     int32_t id = counter + 1;
-    xml::Node child = document.CreateElement(level.tag);
-    child.SetAttribute(level.id, std::to_string(id));
-    child.SetAttribute(level.text, text);
-    child.SetAttribute(level.name, name);
-    if (level.canBeLocal && IsLocal(text)) child.SetAttribute("c_local", "1");
-    child = parent.AppendChild(child);
+    std::string idText = std::to_string(id);
+    xml::Node child =
+        level.canBeLocal && IsLocal(text)
+            ? parent.AppendElement(
+                  level.tag,
+                  {{level.id, idText}, {level.text, text}, {level.name, name}, {"c_local", "1"}})
+            : parent.AppendElement(level.tag,
+                                   {{level.id, idText}, {level.text, text}, {level.name, name}});
     counter = id;
     return child;
   }
@@ -176,10 +176,7 @@ xml::Node Schema::AddFileEntry(std::string_view text, std::string_view name, xml
 
 xml::Node Schema::AddProperty(int16_t bit, std::string_view value, xml::Node file) {
   const char* type = PropertyType(bit);
-  xml::Node property = file.OwnerDocument().CreateElement("p");
-  property.SetAttribute("p_type", type);
-  property.SetAttribute("p_value", value);
-  return file.AppendChild(property);
+  return file.AppendElement("p", {{"p_type", type}, {"p_value", value}});
 }
 
 xml::Node Schema::AddApplication(xml::Node application, xml::Node folder) {

@@ -54,6 +54,7 @@ void Document::Impl::Reset(ParseError error) {
   pool = pugi::xml_node();
   tagPrototypes.clear();
   attributePrototypes.clear();
+  recentPrototypes = {};
   doc.reset();
   parseError = std::move(error);
   Changed();
@@ -86,6 +87,18 @@ pugi::xml_node Document::Impl::NamePool() {
 }
 
 pugi::xml_node Document::Impl::Prototype(std::string_view name, bool attribute) {
+  size_t slot = (name.size() * 7 + (name.empty() ? 0 : name.back()) + (attribute ? 1 : 0)) %
+                recentPrototypes.size();
+  RecentPrototype& recent = recentPrototypes[slot];
+  if (recent.prototype && recent.attribute == attribute && recent.name == name) {
+    return recent.prototype;
+  }
+  pugi::xml_node prototype = FindOrAddPrototype(name, attribute);
+  recent = {std::string(name), attribute, prototype};
+  return prototype;
+}
+
+pugi::xml_node Document::Impl::FindOrAddPrototype(std::string_view name, bool attribute) {
   auto& prototypes = attribute ? attributePrototypes : tagPrototypes;
   auto found = prototypes.find(name);
   if (found != prototypes.end()) return found->second;
@@ -166,6 +179,34 @@ pugi::xml_node Document::Impl::Place(pugi::xml_node parent, const Node& child,
   index.ChildArrived(parent, placed);
   Changed();
   return placed;
+}
+
+pugi::xml_node Document::Impl::AppendElement(
+    pugi::xml_node parent, std::string_view tag,
+    std::initializer_list<std::pair<std::string_view, std::string_view>> attributes) {
+  for (auto at = attributes.begin(); at != attributes.end(); ++at) {
+    CheckText(at->second);
+    if (std::any_of(attributes.begin(), at,
+                    [&](const auto& other) { return other.first == at->first; })) {
+      Fail(kInvalidArgument, fmt::format("The attribute \"{}\" is given twice", at->first));
+    }
+  }
+  // Straight into place: the element is complete before anything can see it, so it needs neither
+  // the detached elements' holder nor index updates per attribute.
+  pugi::xml_node element = parent.append_copy(Prototype(tag, false));
+  if (!element) FailOutOfMemory();
+  try {
+    for (const auto& [name, value] : attributes) {
+      pugi::xml_attribute attr = NewAttribute(element, name);
+      if (!attr || !attr.set_value(value.data(), value.size())) FailOutOfMemory();
+    }
+  } catch (...) {
+    parent.remove_child(element);  // as if nothing had been tried
+    throw;
+  }
+  index.ChildArrived(parent, element);
+  Changed();
+  return element;
 }
 
 void Document::Impl::Destroy(pugi::xml_node node) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <pugixml.hpp>
 #include <string>
@@ -62,6 +63,11 @@ struct Document::Impl {
   // so a failure changes nothing.
   pugi::xml_node Place(pugi::xml_node parent, const Node& child, pugi::xml_node before,
                        pugi::xml_node replacing);
+  // A new `tag` element with `attributes`, appended to the element `parent` (see
+  // Node::AppendElement).
+  pugi::xml_node AppendElement(
+      pugi::xml_node parent, std::string_view tag,
+      std::initializer_list<std::pair<std::string_view, std::string_view>> attributes);
   // Removes `node` from its parent and frees it with everything below.
   void Destroy(pugi::xml_node node);
   void Changed() { ++modifications; }
@@ -80,6 +86,7 @@ struct Document::Impl {
   // and copies of a parsed node point to that buffer instead of copying the text.
   pugi::xml_node NamePool();
   pugi::xml_node Prototype(std::string_view name, bool attribute);
+  pugi::xml_node FindOrAddPrototype(std::string_view name, bool attribute);
   pugi::xml_node pool;
   // Looked up by string_view, without making a string.
   struct NameHash {
@@ -89,6 +96,14 @@ struct Document::Impl {
   using Prototypes = std::unordered_map<std::string, pugi::xml_node, NameHash, std::equal_to<>>;
   Prototypes tagPrototypes;
   Prototypes attributePrototypes;
+  // The names last used, by length and last letter: a new element of a kind made a million times
+  // then finds its few names without hashing them.
+  struct RecentPrototype {
+    std::string name;
+    bool attribute = false;
+    pugi::xml_node prototype;
+  };
+  std::array<RecentPrototype, 16> recentPrototypes;
 
   void CheckPlacement(pugi::xml_node parent, pugi::xml_node child, pugi::xml_node replacing) const;
 };

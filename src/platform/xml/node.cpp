@@ -2,26 +2,11 @@
 
 #include "platform/failure.h"
 #include "platform/xml/document_impl.h"
+#include "platform/xml/text_builder.h"
 #include "platform/xml/tree_walk.h"
 
 namespace trl::xml {
 namespace {
-
-class SizeCounter : public pugi::xml_writer {
- public:
-  void write(const void* /*data*/, size_t size) override { total += size; }
-
-  size_t total = 0;
-};
-
-class StringWriter : public pugi::xml_writer {
- public:
-  void write(const void* data, size_t size) override {
-    text.append(static_cast<const char*>(data), size);
-  }
-
-  std::string text;
-};
 
 // Prints `node` (a whole document without the detached elements' holder) to `out`.
 void Print(pugi::xml_node node, pugi::xml_node holder, pugi::xml_writer& out) {
@@ -193,6 +178,15 @@ Node Node::AppendChild(Node child) {
   return impl.Wrap(impl.Place(node, child, pugi::xml_node(), pugi::xml_node()));
 }
 
+Node Node::AppendElement(
+    std::string_view tag,
+    std::initializer_list<std::pair<std::string_view, std::string_view>> attributes) {
+  pugi::xml_node node = Require(*this);
+  if (node.type() != pugi::node_element) Fail(kInvalidArgument, "Only elements take new elements");
+  Document::Impl& impl = *document_->impl_;
+  return impl.Wrap(impl.AppendElement(node, tag, attributes));
+}
+
 Node Node::InsertBefore(Node child, Node reference) {
   if (reference.IsNull()) return AppendChild(child);
   pugi::xml_node node = Require(*this);
@@ -274,13 +268,9 @@ void Node::SetText(std::string_view text) {
 std::string Node::Xml() const {
   pugi::xml_node node = Require(*this);
   pugi::xml_node holder = document_->impl_->holder;
-  // Sized first: a large document's text then takes its own size, not up to twice that.
-  SizeCounter size;
-  Print(node, holder, size);
-  StringWriter out;
-  out.text.reserve(size.total);
+  TextBuilder out;
   Print(node, holder, out);
-  return std::move(out.text);
+  return out.Take();
 }
 
 }  // namespace trl::xml

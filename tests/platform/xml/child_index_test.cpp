@@ -52,6 +52,9 @@ class RandomChanges {
         [&] { parent.ReplaceChild(foreign, sibling); },
         [&] { parent.AppendChild(child.CloneNode(Chance(50))); },
         [&] { parent.AppendChild(NewDetachedParent(doc)); },
+        [&] {
+          parent.AppendElement(Chance(70) ? "f" : "g", {{"x", Key()}, {"k", Key()}});
+        },
         [&] { parent.SetText("text"); },
         [&] { doc.SetDocumentElement(element); },
         [&] { doc.LoadXml(kStarts[Pick(2)]); }};

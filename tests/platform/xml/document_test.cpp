@@ -212,16 +212,24 @@ TEST(XmlDocumentTest, MisuseFailsWithFiveAndChangesNothing) {
                                                 [&] { text.SetAttribute("v", "1"); },
                                                 [&] { doc.SetDocumentElement(text); },
                                                 [&] { doc.AsNode().SetText("t"); },
-                                                [&] { doc.AsNode().CloneNode(true); }};
+                                                [&] { doc.AsNode().CloneNode(true); },
+                                                [&] { doc.AsNode().AppendElement("n", {}); },
+                                                [&] { text.AppendElement("n", {}); },
+                                                [&] {
+                                                  a.AppendElement("n", {{"v", "1"}, {"v", "2"}});
+                                                }};
   for (std::string_view name : {"1a", "", "a b", "-x", "a\xFF"}) {
     actions.push_back([&doc, name] { doc.CreateElement(name); });
     actions.push_back([&a, name] { a.SetAttribute(name, "1"); });
+    actions.push_back([&a, name] { a.AppendElement(name, {{"v", "1"}}); });
+    actions.push_back([&a, name] { a.AppendElement("n", {{"v", "1"}, {name, "1"}}); });
   }
   const std::string_view controls[] = {"bell\x07", std::string_view("nul\0x", 5), "\xC3",
                                        "\xEF\xBF\xBE", "\xED\xA0\x80"};
   for (std::string_view value : controls) {
     actions.push_back([&a, value] { a.SetAttribute("v", value); });
     actions.push_back([&a, value] { a.SetText(value); });
+    actions.push_back([&a, value] { a.AppendElement("n", {{"v", "1"}, {"w", value}}); });
   }
   uint64_t count = doc.ModificationCount();
   for (size_t i = 0; i < actions.size(); ++i) {

@@ -50,16 +50,16 @@ struct ItemStatus {
 
 ItemStatus ToItemStatus(const struct stat& status);
 
-// The `wanted` attribute bits of an item, reading only what those bits need: DOS attributes on an
-// SMB mount; otherwise the name for hidden, `isSystem()` for system and `mode()` for read-only.
-template <class IsSystem, class Mode>
-uint16_t ItemAttributes(const FolderPlace& dosSource, const std::string& native,
-                        std::string_view nativeName, uint16_t wanted, IsSystem isSystem,
-                        Mode mode) {
+// The `wanted` attribute bits of an item, reading only what those bits need: DOS attributes of
+// the item at `native()` on an SMB mount; otherwise the name for hidden, `isSystem()` for system
+// and `mode()` for read-only. The item's path is only made when DOS attributes are read.
+template <class Native, class IsSystem, class Mode>
+uint16_t ItemAttributes(const FolderPlace& dosSource, Native native, std::string_view nativeName,
+                        uint16_t wanted, IsSystem isSystem, Mode mode) {
   wanted &= kAllAttributes;
   if (wanted == 0) return 0;
   if (dosSource.HasDosAttributes()) {
-    if (auto dos = DecodeDosAttributes(GetExtendedAttribute(native, kDosAttributeName))) {
+    if (auto dos = DecodeDosAttributes(GetExtendedAttribute(native(), kDosAttributeName))) {
       return *dos & wanted;
     }
   }

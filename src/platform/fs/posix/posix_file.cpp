@@ -50,7 +50,7 @@ std::string PosixFile::Path() const { return folder_->PathChild(nativeName_); }
 
 uint16_t PosixFile::Attributes(uint16_t wanted) const {
   return ItemAttributes(
-      *folder_, Native(), nativeName_, wanted, [this] { return IsSystem(); },
+      *folder_, [this] { return Native(); }, nativeName_, wanted, [this] { return IsSystem(); },
       [this] { return Status().mode; });
 }
 

@@ -4,10 +4,12 @@
 
 #include <cerrno>
 #include <optional>
+#include <thread>
 
 #include "platform/failure.h"
 #include "platform/fs/component_path.h"
 #include "platform/fs/posix/folder_place.h"
+#include "platform/fs/posix/listing_read_ahead.h"
 #include "platform/fs/posix/name_resolver.h"
 #include "platform/fs/posix/posix_file.h"
 #include "platform/fs/posix/posix_folder.h"
@@ -40,7 +42,10 @@ std::string ParentOf(const std::string& path, char separator) {
 class PosixFileSystem final : public FileSystem {
  public:
   explicit PosixFileSystem(ShareTable shares)
-      : shares_(std::move(shares)), memory_(std::make_shared<WalkMemory>()) {}
+      : shares_(std::move(shares)),
+        memory_(std::make_shared<WalkMemory>()),
+        readAhead_(std::thread::hardware_concurrency() > 1 ? std::make_shared<ListingReadAhead>()
+                                                           : nullptr) {}
 
   bool FileExists(std::string_view path) override {
     Item item;
@@ -73,7 +78,7 @@ class PosixFileSystem final : public FileSystem {
                      ? item.place
                      : std::make_shared<FolderPlace>(std::move(item.native), std::move(item.path));
     return std::make_unique<PosixFolder>(std::move(place), std::move(item.nativeName),
-                                         item.shareRoot, item.status, memory_);
+                                         item.shareRoot, item.status, memory_, readAhead_);
   }
 
  private:
@@ -150,6 +155,8 @@ class PosixFileSystem final : public FileSystem {
   ShareTable shares_;
   NameResolver resolver_;
   std::shared_ptr<WalkMemory> memory_;
+  // One thread more lists ahead of a walk; with a single core it would only take turns with it.
+  std::shared_ptr<ListingReadAhead> readAhead_;
   // A walker asks about each subfolder it has listed three times running, with one text:
   // FileExists, FolderExists and GetFolder of the subfolder's Path and "\". The last folder found
   // is remembered with its text, so the three cost one stat; any other lookup drops it, and files

@@ -1,22 +1,21 @@
 #include "platform/fs/posix/posix_folder.h"
 
-#include <dirent.h>
-
-#include <cerrno>
-#include <cstring>
-
 #include "platform/failure.h"
-#include "platform/fs/posix/posix_file.h"
+#include "platform/fs/posix/folder_listing.h"
 #include "platform/text.h"
 
 namespace trl::fs::posix {
+
+PosixFolder::~PosixFolder() {
+  if (readAhead_ && !files_.empty()) readAhead_->Recycle(std::move(files_));
+}
 
 std::string PosixFolder::Name() const { return NameFromNative(nativeName_); }
 
 uint16_t PosixFolder::Attributes(uint16_t wanted) const {
   // A folder (or a link to one) is never a system item.
   return ItemAttributes(
-      *place_, place_->Native(), nativeName_, wanted, [] { return false; },
+      *place_, [this] { return place_->Native(); }, nativeName_, wanted, [] { return false; },
       [this] { return Status().mode; });
 }
 
@@ -49,47 +48,20 @@ const ItemStatus& PosixFolder::Status() const {
   return *status_;
 }
 
-// Sorts the entries by d_type, so a plain file or folder costs no call; links and entries of
-// unknown type cost one stat each. A link to a folder is left out (a walk never loops) and so is
-// a dangling link.
 void PosixFolder::List() {
-  if (listed_) return;
-  std::unique_ptr<DIR, int (*)(DIR*)> stream(OpenDirectory(place_->Native()), closedir);
-  if (!stream) Fail(ListingFailure(errno));
-  Collection<File> files;
-  Collection<Folder> subFolders;
-  for (;;) {
-    errno = 0;  // readdir tells an error from the end only through errno
-    const dirent* entry = readdir(stream.get());
-    if (entry == nullptr) break;
-    const char* name = entry->d_name;
-    if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) continue;
-    unsigned char type = entry->d_type;
-    std::optional<ItemStatus> status;
-    if (type == DT_UNKNOWN) {
-      struct stat item {};
-      if (LStat(place_->NativeChild(name), item) != 0) continue;  // gone since it was listed
-      type = static_cast<unsigned char>(IFTODT(item.st_mode));
+  if (!listed_) {
+    FolderListing listing = readAhead_ ? readAhead_->Take(place_) : ListFolder(place_);
+    listingError_ = listing.error;
+    files_ = std::move(listing.files);
+    for (auto& sub : listing.subFolders) {
+      if (memory_) memory_->Listed(place_, sub.place);
+      subFolders_.push_back(std::make_unique<PosixFolder>(std::move(sub.place),
+                                                          std::move(sub.nativeName), false,
+                                                          std::nullopt, memory_, readAhead_));
     }
-    if (type == DT_LNK) {
-      struct stat target {};
-      if (Stat(place_->NativeChild(name), target) != 0 || S_ISDIR(target.st_mode)) continue;
-      status = ToItemStatus(target);
-    }
-    if (type == DT_DIR) {
-      auto place =
-          std::make_shared<FolderPlace>(place_->NativeChild(name), place_->PathChild(name));
-      if (memory_) memory_->Listed(place_, place);
-      subFolders.push_back(
-          std::make_unique<PosixFolder>(std::move(place), name, false, std::nullopt, memory_));
-    } else {
-      files.push_back(std::make_unique<PosixFile>(place_, name, type, status));
-    }
+    listed_ = true;
   }
-  if (errno != 0) Fail(ListingFailure(errno));
-  files_ = std::move(files);
-  subFolders_ = std::move(subFolders);
-  listed_ = true;
+  if (listingError_ != 0) Fail(ListingFailure(listingError_));
 }
 
 }  // namespace trl::fs::posix

@@ -1,0 +1,28 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/fs/file_system.h"
+#include "platform/fs/posix/folder_place.h"
+
+namespace trl::fs::posix {
+
+// One folder's entries as one readdir pass finds them, in the order it finds them.
+struct FolderListing {
+  struct SubFolder {
+    std::shared_ptr<FolderPlace> place;
+    std::string nativeName;
+  };
+  int error = 0;  // the errno value that stopped the listing, 0 when it is complete
+  Collection<File> files;
+  std::vector<SubFolder> subFolders;
+};
+
+// Sorts the entries by d_type, so a plain file or folder costs no call; links and entries of
+// unknown type cost one stat each. A link to a folder is left out (a walk never loops) and so is
+// a dangling link. Touches nothing but `folder`'s fixed location, so any thread may list.
+FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder);
+
+}  // namespace trl::fs::posix

@@ -1,0 +1,126 @@
+#include "platform/fs/posix/listing_read_ahead.h"
+
+#include <algorithm>
+#include <system_error>
+
+namespace trl::fs::posix {
+
+ListingReadAhead::~ListingReadAhead() {
+  {
+    std::lock_guard lock(mutex_);
+    stop_ = true;
+  }
+  work_.notify_one();
+  if (reader_.joinable()) reader_.join();
+}
+
+FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder) {
+  std::unique_lock lock(mutex_);
+  if (!StartReader()) {
+    lock.unlock();
+    return ListFolder(folder);
+  }
+  bool asked = false;
+  for (;;) {
+    auto found = std::find_if(ready_.begin(), ready_.end(),
+                              [&](const Ready& ready) { return ready.folder == folder; });
+    if (found != ready_.end()) {
+      std::optional<FolderListing> listing = std::move(found->listing);
+      DropReady(found + 1);
+      if (readerIdle_ && BelowHalf()) work_.notify_one();
+      lock.unlock();
+      return listing ? std::move(*listing) : ListFolder(folder);
+    }
+    if (!asked) {
+      ReadNext(folder);
+      asked = true;
+    }
+    walkWaiting_ = true;
+    listed_.wait(lock);
+    walkWaiting_ = false;
+  }
+}
+
+void ListingReadAhead::Recycle(Collection<File> files) {
+  std::lock_guard lock(mutex_);
+  if (reader_.joinable()) toFree_.push_back(std::move(files));
+}
+
+void ListingReadAhead::ReadNext(const std::shared_ptr<FolderPlace>& folder) {
+  // Everything ready comes before `folder` in walk order, or belongs to a walk left behind.
+  DropReady(ready_.end());
+  if (reading_ == folder && !readingDropped_) return;
+  readingDropped_ = reading_ != nullptr;
+  // Folders above `folder` on the stack come before it: the walk passed them by. A folder the
+  // read-ahead never met starts a new subtree on top; what lies below it may still be visited.
+  auto at = std::find(toRead_.rbegin(), toRead_.rend(), folder);
+  if (at != toRead_.rend()) {
+    toRead_.erase(std::prev(at.base()), toRead_.end());
+  }
+  toRead_.push_back(folder);
+  work_.notify_one();
+}
+
+bool ListingReadAhead::StartReader() {
+  if (reader_.joinable()) return true;
+  try {
+    reader_ = std::thread([this] { Run(); });
+  } catch (const std::system_error&) {
+    return false;  // the walk lists for itself
+  }
+  return true;
+}
+
+void ListingReadAhead::DropReady(std::deque<Ready>::iterator end) {
+  for (auto it = ready_.begin(); it != end; ++it) readyEntries_ -= it->entries;
+  ready_.erase(ready_.begin(), end);
+}
+
+bool ListingReadAhead::HasRoom() const {
+  return ready_.size() < maxReadyFolders_ && readyEntries_ < maxReadyEntries_;
+}
+
+bool ListingReadAhead::BelowHalf() const {
+  return ready_.size() <= maxReadyFolders_ / 2 && readyEntries_ <= maxReadyEntries_ / 2;
+}
+
+void ListingReadAhead::Run() {
+  std::unique_lock lock(mutex_);
+  for (;;) {
+    readerIdle_ = true;
+    work_.wait(lock, [this] { return stop_ || (!toRead_.empty() && HasRoom()); });
+    readerIdle_ = false;
+    if (stop_) return;
+    std::shared_ptr<FolderPlace> folder = std::move(toRead_.back());
+    toRead_.pop_back();
+    reading_ = folder;
+    readingDropped_ = false;
+    std::vector<Collection<File>> toFree;
+    toFree.swap(toFree_);
+    lock.unlock();
+    toFree.clear();
+    std::optional<FolderListing> listing;
+    try {
+      listing = ListFolder(folder);
+    } catch (const std::exception&) {
+      // Left to the walk's thread, which lists the folder itself and meets the failure there.
+    }
+    lock.lock();
+    reading_.reset();
+    if (!readingDropped_) {
+      size_t entries = 0;
+      if (listing) {
+        const auto& subFolders = listing->subFolders;
+        for (auto sub = subFolders.rbegin(); sub != subFolders.rend(); ++sub) {
+          toRead_.push_back(sub->place);
+        }
+        entries = listing->files.size() + subFolders.size();
+      }
+      readyEntries_ += entries;
+      ready_.push_back({std::move(folder), std::move(listing), entries});
+    }
+    if (walkWaiting_) listed_.notify_one();
+  }
+}
+
+}  // namespace trl::fs::posix

@@ -1,0 +1,111 @@
+#include "platform/fs/posix/listing_read_ahead.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "support/temp_tree.h"
+
+namespace trl::fs::posix {
+namespace {
+
+using trl::testing::TempTree;
+
+// What a listing says, in its order: "error" or the files' names, "|", the subfolders' names.
+std::string Summary(const FolderListing& listing) {
+  if (listing.error != 0) return "error " + std::to_string(listing.error);
+  std::string text;
+  for (const auto& file : listing.files) text += file->Name() + " ";
+  text += "|";
+  for (const auto& sub : listing.subFolders) text += " " + sub.nativeName;
+  return text;
+}
+
+// Every folder has two files; the names of the folders that walks pass over end in "1".
+class ListingReadAheadTest : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    const auto add = [&](const std::string& folder) {
+      if (!folder.empty()) tree_.AddFolder(folder);
+      std::string prefix = folder.empty() ? "" : folder + "/";
+      tree_.AddFile(prefix + "x");
+      tree_.AddFile(prefix + "y");
+    };
+    add("");
+    for (char a = '0'; a < '6'; ++a) {
+      std::string first = std::string("a") + a;
+      add(first);
+      for (char b = '0'; b < '5'; ++b) {
+        std::string second = first + "/b" + b;
+        add(second);
+        for (char c = '0'; c < '3'; ++c) add(second + "/c" + c);
+      }
+    }
+  }
+
+  std::shared_ptr<FolderPlace> Root() const {
+    return std::make_shared<FolderPlace>(tree_.Root(), tree_.Path());
+  }
+
+  TempTree tree_;
+};
+
+// Whatever way a walk takes (depth first as expected, passing subtrees by, jumping elsewhere and
+// back), each folder gets the listing a direct readdir gives; small limits keep the read-ahead
+// stopping and starting again.
+TEST_F(ListingReadAheadTest, EveryFolderGetsItsOwnListingWhateverTheWalk) {
+  struct Case {
+    const char* walk;
+    bool skipOnes;  // pass over folders named "?1" with everything below them
+    int jumpEvery;  // take an unrelated folder after every so many folders (0: never)
+    bool twice;     // take each folder a second time
+    size_t maxFolders, maxEntries;
+  };
+  const Case cases[] = {
+      {"depth first", false, 0, false, 128, 1 << 15},
+      {"depth first, small limits", false, 0, false, 2, 5},
+      {"passing subtrees by", true, 0, false, 4, 1 << 15},
+      {"jumping away and back", false, 7, false, 3, 1 << 15},
+      {"everything twice", true, 0, true, 3, 8},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.walk);
+    ListingReadAhead readAhead(c.maxFolders, c.maxEntries);
+    int taken = 0;
+    int visited = 0;
+    std::function<void(const std::shared_ptr<FolderPlace>&)> walk =
+        [&](const std::shared_ptr<FolderPlace>& folder) {
+          ++visited;
+          std::string expected = Summary(ListFolder(folder));
+          FolderListing listing = readAhead.Take(folder);
+          ASSERT_EQ(Summary(listing), expected) << folder->Native();
+          if (c.twice) {
+            ASSERT_EQ(Summary(readAhead.Take(folder)), expected);
+          }
+          if (c.jumpEvery != 0 && ++taken % c.jumpEvery == 0) {
+            auto elsewhere = std::make_shared<FolderPlace>(tree_.Native("a2/b3"), "");
+            ASSERT_EQ(Summary(readAhead.Take(elsewhere)), Summary(ListFolder(elsewhere)));
+          }
+          for (const auto& sub : listing.subFolders) {
+            if (!(c.skipOnes && sub.nativeName.ends_with('1'))) walk(sub.place);
+          }
+        };
+    walk(Root());
+    EXPECT_EQ(visited, c.skipOnes ? 1 + 5 + 5 * 4 + 5 * 4 * 2 : 1 + 6 + 6 * 5 + 6 * 5 * 3);
+  }
+}
+
+TEST_F(ListingReadAheadTest, AFolderThatCannotBeListedGivesItsError) {
+  ListingReadAhead readAhead;
+  readAhead.Take(Root());
+  auto missing = std::make_shared<FolderPlace>(tree_.Native("nowhere"), "");
+  EXPECT_EQ(readAhead.Take(missing).error, ENOENT);
+  auto file = std::make_shared<FolderPlace>(tree_.Native("a0/x"), "");
+  EXPECT_EQ(readAhead.Take(file).error, ENOTDIR);
+}
+
+}  // namespace
+}  // namespace trl::fs::posix
