@@ -31,13 +31,14 @@ std::string OneFileFingerprint(std::string_view properties) {
 
 TEST_F(CompareMatchTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
   tree_.AddFile("data.bin", "abc");
-  std::tm written{.tm_sec = 9,
-                  .tm_min = 8,
-                  .tm_hour = 7,
-                  .tm_mday = 6,
-                  .tm_mon = 4,
-                  .tm_year = 124,
-                  .tm_isdst = -1};
+  std::tm written{};
+  written.tm_year = 124;  // 2024-05-06 07:08:09, local time
+  written.tm_mon = 4;
+  written.tm_mday = 6;
+  written.tm_hour = 7;
+  written.tm_min = 8;
+  written.tm_sec = 9;
+  written.tm_isdst = -1;
   const timespec times[2] = {{std::mktime(&written), 0}, {std::mktime(&written), 0}};
   ASSERT_EQ(utimensat(AT_FDCWD, tree_.Native("data.bin").c_str(), times, 0), 0);
   const std::string size = R"(<p p_type="2" p_weight="1" p_value="3"/>)";
