@@ -6,7 +6,6 @@
 #include <optional>
 #include <string>
 
-#include "platform/clock.h"
 #include "platform/fs/file_system.h"
 
 namespace trl {
@@ -40,10 +39,11 @@ class Learnt {
 struct LocalFileFacts {
   Learnt<bool> exists;
   Learnt<std::unique_ptr<fs::File>> file;
-  Learnt<std::string> version;  // property kind 1
-  Learnt<int64_t> size;         // kind 2
-  Learnt<std::string> digest;   // kind 3
-  Learnt<DateTime> written;     // kind 4
+  // The property values in the form their kinds compare.
+  Learnt<std::string> version;  // kind 1, lower case
+  Learnt<int32_t> size;         // kind 2
+  Learnt<std::string> digest;   // kind 3, lower case
+  Learnt<std::string> written;  // kind 4, formatted
 };
 
 }  // namespace trl

@@ -21,29 +21,42 @@ using compare::kClass;
 
 namespace {
 
-// Whether the file's value of property `kind` equals the expected text, compared the way the
-// kind's values compare. Only the kind asked for is read, so a file is hashed only when a property
-// wants its digest.
-bool PropertyAgrees(int16_t kind, const Schema& schema, const fs::File* file, LocalFileFacts& facts,
-                    const std::string& expected) {
-  auto local = [&](auto& learnt, auto reader) -> decltype(auto) {
-    return learnt.Get([&] { return (schema.*reader)(Use(file)); });
+// Whether the file's value of the property equals the expected one, compared the way the kind's
+// values compare. Only the kind asked for is read, so a file is hashed only when a property wants
+// its digest.
+bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& schema,
+                    const fs::File* file, LocalFileFacts& facts) {
+  auto local = [&](auto& learnt, auto form) -> decltype(auto) {
+    return learnt.Get([&] { return form(Use(file)); });
   };
-  switch (kind) {
+  bool agrees = false;
+  switch (property.kind) {
     case 1:
-      return LowerCase(local(facts.version, &Schema::ReadPropertyType1)) == LowerCase(expected);
+      agrees = local(facts.version, [&](const fs::File& f) {
+                 return LowerCase(schema.ReadPropertyType1(f));
+               }) == property.expectedText;
+      break;
     case 2:
-      return ToInt32(static_cast<double>(local(facts.size, &Schema::ReadPropertyType2))) ==
-             ToInt32(expected);
+      agrees = local(facts.size, [&](const fs::File& f) {
+                 return ToInt32(static_cast<double>(schema.ReadPropertyType2(f)));
+               }) == property.expectedNumber;
+      break;
     case 3:
-      return LowerCase(local(facts.digest, &Schema::ReadPropertyType3)) == LowerCase(expected);
+      agrees = local(facts.digest, [&](const fs::File& f) {
+                 return LowerCase(schema.ReadPropertyType3(f));
+               }) == property.expectedText;
+      break;
     case 4:
-      return FormatDateTime(local(facts.written, &Schema::ReadPropertyType4)) ==
-             FormatDateTime(ToDateTime(expected));
+      agrees = local(facts.written, [&](const fs::File& f) {
+                 return FormatDateTime(schema.ReadPropertyType4(f));
+               }) == property.expectedText;
+      break;
     default:
-      Raise(kErrUnknownPropertyType, "Unknown property type: " + std::to_string(kind), kClass,
-            compare::kMatchFileLabel);
+      Raise(kErrUnknownPropertyType, "Unknown property type: " + std::to_string(property.kind),
+            kClass, compare::kMatchFileLabel);
   }
+  if (property.conversionFailure) std::rethrow_exception(property.conversionFailure);
+  return agrees;
 }
 
 }  // namespace
@@ -66,7 +79,7 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
     bool agrees = false;
     on([&] {
       if (property.expectedFailure) std::rethrow_exception(property.expectedFailure);
-      agrees = PropertyAgrees(property.kind, Use(objSchema), file, facts, property.expected);
+      agrees = PropertyAgrees(property, Use(objSchema), file, facts);
     });
     if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });
   }

@@ -4,7 +4,9 @@
 
 #include "frame/attributes.h"
 #include "frame/vocabulary.h"
+#include "platform/clock.h"
 #include "platform/convert.h"
+#include "platform/text.h"
 
 namespace trl {
 namespace {
@@ -32,10 +34,19 @@ FingerprintFile::FingerprintFile(const xml::Node& f) : f_(f), fit_(f) {
     Try(property.readFailures, [&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
     property.kind = kind;
     property.bit = bit;
+    std::string expected;
     try {
-      property.expected = TextOf(p, vocab::p_value);
+      expected = TextOf(p, vocab::p_value);
     } catch (...) {
       property.expectedFailure = std::current_exception();
+      continue;
+    }
+    try {
+      if (kind == 1 || kind == 3) property.expectedText = LowerCase(expected);
+      if (kind == 2) property.expectedNumber = ToInt32(expected);
+      if (kind == 4) property.expectedText = FormatDateTime(ToDateTime(expected));
+    } catch (...) {
+      property.conversionFailure = std::current_exception();
     }
   }
   Details& details = details_;

@@ -17,13 +17,16 @@ namespace trl {
 class FingerprintFile {
  public:
   // One property, read in order: its kind, its weight and the bit value of that weight (each
-  // keeping the property before's value when it cannot be read), then the expected value.
+  // keeping the property before's value when it cannot be read), then the expected value, in the
+  // form its kind compares: lower case (kinds 1 and 3), a 32-bit number (2), a formatted time (4).
   struct Property {
     std::vector<std::exception_ptr> readFailures;
     int16_t kind = 0;
     int16_t bit = 0;
-    std::string expected;
-    std::exception_ptr expectedFailure;
+    std::exception_ptr expectedFailure;    // the value could not be read
+    std::exception_ptr conversionFailure;  // nor put in the form its kind compares
+    std::string expectedText;
+    int32_t expectedNumber = 0;
   };
   // What a find records: the file's f_id, p_max and f_bitmask (0 when unreadable).
   struct Details {
