@@ -75,7 +75,8 @@ class Compare : public Worker {
   // The path of the candidate's file named `name`, on its own computer or through the network.
   static std::string CandidatePath(const LocalFileRecord& record, const std::string& name);
 
-  void FillRecordset();
+  // `files`: how many f the local files hold, at most what the index gets.
+  void FillRecordset(size_t files);
   int16_t MatchFile(const std::string& path, const FingerprintFile& f);
   bool UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int16_t mask);
   // The same for a drafted copy, with the same reports.

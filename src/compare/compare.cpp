@@ -87,11 +87,11 @@ void Compare::Match() {
     applications = EveryElement(*objFingerprintDOM, vocab::a);
     e_a_total = ToInt32(static_cast<double>(applications.size()));
   });
-  bool hasFiles = false;
-  on([&] { hasFiles = !EveryElement(*objLocalFilesDOM, vocab::f).empty(); });
-  if (hasFiles) {
+  size_t files = 0;
+  on([&] { files = EveryElement(*objLocalFilesDOM, vocab::f).size(); });
+  if (files != 0) {
     BeginRun(on);
-    FillRecordset();
+    FillRecordset(files);
     for (const xml::Node& a : applications) {
       YieldIfAsynchronous(on);
       if (status_ == kStatusCancelled) break;

@@ -1,6 +1,7 @@
 // Taking back the versions that lack a weighted file, and the results branches that leaves empty.
 #include <algorithm>
 #include <optional>
+#include <string_view>
 #include <tuple>
 
 #include "compare/compare_names.h"
@@ -17,10 +18,9 @@ using compare::kClass;
 
 namespace {
 
-// The id in an element's first attribute, as the numbering wrote it.
-int32_t FirstId(const xml::Node& element) {
-  auto attributes = element.Attributes();
-  return attributes.empty() ? 0 : ToInt32(attributes.front().second);
+// The number in an element's id attribute, as the numbering wrote it.
+int32_t IdOf(const xml::Node& element, std::string_view attribute) {
+  return ToInt32(element.GetAttribute(attribute).value_or("0"));
 }
 
 }  // namespace
@@ -70,10 +70,12 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
 }
 
 bool Compare::RemoveEmptiedCopy(const std::string& id) {
+  auto copies = copiesById_.find(id);
+  if (copies == copiesById_.end() || id.find('\'') != std::string::npos) return false;
   xml::Node copy;
-  for (const xml::Node& candidate : CopiesOf(id)) {
-    if (candidate.ChildElements(vocab::v).empty()) {
-      copy = candidate;
+  for (const ApplicationCopy& candidate : copies->second) {
+    if (candidate.element.ChildElements(vocab::v).empty()) {
+      copy = candidate.element;
       break;
     }
   }
@@ -98,12 +100,14 @@ bool Compare::RemoveEmptiedCopy(const std::string& id) {
 }
 
 void Compare::RememberCopy(xml::Node copy) {
+  if (knownCopies_.contains(copy.Id())) return;
   // A copy without an a_id is one no selection by a_id would find.
   std::optional<std::string> id = copy.GetAttribute(vocab::a_id);
-  if (!id || knownCopies_.contains(copy.Id())) return;
+  if (!id) return;
   xml::Node d = copy.ParentNode();
   xml::Node m = d.ParentNode();
-  ApplicationCopy entry{FirstId(m.ParentNode()), FirstId(m), FirstId(d), copy};
+  ApplicationCopy entry{IdOf(m.ParentNode(), vocab::c_id), IdOf(m, vocab::m_id),
+                        IdOf(d, vocab::d_id), copy};
   auto before = [](const ApplicationCopy& x, const ApplicationCopy& y) {
     return std::tie(x.computer, x.drive, x.folder) < std::tie(y.computer, y.drive, y.folder);
   };

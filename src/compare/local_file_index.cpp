@@ -85,6 +85,8 @@ size_t LocalFileIndex::Matches::size() const {
   return count;
 }
 
+void LocalFileIndex::Reserve(size_t files) { records_.reserve(files); }
+
 void LocalFileIndex::AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
                               std::string drive, std::string encodedDrive) {
   drives_.push_back({std::move(machine), std::move(encodedMachine), localMachine, std::move(drive),

@@ -70,6 +70,9 @@ class LocalFileIndex {
     uint32_t first_ = kNone;
   };
 
+  // Room for `files` records, made at once (names share keys, so the key table grows as needed).
+  void Reserve(size_t files);
+
   // The computer and drive of the records added next.
   void AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
                 std::string drive, std::string encodedDrive);

@@ -53,12 +53,13 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
   }
 }
 
-void Compare::FillRecordset() {
+void Compare::FillRecordset(size_t files) {
   OnError on{kClass, compare::kFillRecordsetLabel};
   rsLocalFiles.reset();
   on([&] {
     try {
       rsLocalFiles = std::make_unique<LocalFileIndex>();
+      rsLocalFiles->Reserve(files);
     } catch (const std::bad_alloc&) {
       Raise(kErrUnableToCreate, "Unable to create an instance of ADODB.Recordset", kClass,
             compare::kFillRecordsetLabel);
