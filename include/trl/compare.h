@@ -66,7 +66,11 @@ class Compare : public Worker {
   void Match();
   void Finish();
   bool MatchApplication(xml::Node a);
+  struct VersionMatch;
   bool MatchVersion(xml::Node v);
+  // Files the find of a local file for the version's file under its application folder.
+  void RecordFind(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder,
+                  const FingerprintFile& file, int16_t mask);
   // Whether the application's copies will certainly be pruned once its versions are matched, so
   // that version copies can be drafted first and made only when complete.
   bool PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const;

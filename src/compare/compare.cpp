@@ -174,21 +174,33 @@ bool Compare::PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>&
   return true;
 }
 
+// One fingerprint version being matched: what its last find made or found (kept when a step
+// fails, as a failed step leaves its value), and its drafted copies.
+struct Compare::VersionMatch {
+  VersionMatch(xml::Node v, const std::vector<xml::Node>& files, bool drafting)
+      : v(v), files(files), drafting(drafting) {}
+
+  static constexpr size_t kNoDraft = SIZE_MAX;  // the copy was made already: no draft
+
+  xml::Node v;
+  const std::vector<xml::Node>& files;
+  bool drafting;
+  std::optional<VersionFiles> shape;
+  std::vector<VersionDraft> drafts;
+  std::unordered_map<const void*, size_t> draftOf;  // by application copy
+  xml::Node c, m, d, aResult, vResult;
+};
+
 bool Compare::MatchVersion(xml::Node v) {
   OnError on{kClass, compare::kMatchVersionLabel};
   bool found = false;
   std::vector<xml::Node> files;
   on([&] { files = v.GetElementsByTagName(vocab::f); });
   // Copies of this version are drafted when the application's pruning follows for certain.
-  bool drafting = draftsFor_ && v.ParentNode() == draftsFor_;
-  std::optional<VersionFiles> shape;
-  std::vector<VersionDraft> drafts;
-  std::unordered_map<const void*, size_t> draftOf;  // by application copy; kNoDraft: made already
-  constexpr size_t kNoDraft = SIZE_MAX;
+  VersionMatch match(v, files, draftsFor_ && v.ParentNode() == draftsFor_);
   // What a failed step would have produced keeps its value from the file or candidate before.
   std::string name, key, appFolder;
   int16_t mask = -1;
-  xml::Node c, m, d, aResult, vResult;
   for (const xml::Node& f : files) {
     YieldIfAsynchronous(on);
     on([&] { name = LowerCase(TextOf(f, vocab::f_name)); });
@@ -208,46 +220,53 @@ bool Compare::MatchVersion(xml::Node v) {
       }
       YieldIfAsynchronous(on);
       if (mask < 0) continue;
-      on([&] {
-        c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
-                                       objResultsDOM->DocumentElement(), lngComputerCounter);
-      });
-      on([&] {
-        m = Use(objSchema).AddDrive(record.Drive(), record.EncodedDrive(), c, lngDriveCounter);
-      });
-      on([&] {
-        Schema& schema = Use(objSchema);
-        d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), m, lngFolderCounter);
-      });
-      on([&] {
-        aResult = Use(objSchema).AddApplication(v.ParentNode(), d);
-        RememberCopy(aResult);
-      });
+      RecordFind(match, record, appFolder, *file, mask);
       found = true;
-      if (drafting && aResult) {
-        auto [at, added] = draftOf.try_emplace(aResult.Id(), drafts.size());
-        if (added) {
-          if (objResultsDOM->FindChild(aResult, vocab::v, vocab::v_id,
-                                       v.GetAttribute(vocab::v_id).value_or(""))) {
-            at->second = kNoDraft;
-          } else {
-            if (!shape) shape.emplace(files);
-            drafts.emplace_back(aResult, files.size());
-          }
-        }
-        if (at->second != kNoDraft) {
-          UpdateDraftDetails(drafts[at->second], *shape, *file, mask);
-          continue;
-        }
-      }
-      on([&] { vResult = Use(objSchema).AddVersion(v, aResult); });
-      on([&] { UpdateFileDetails(vResult, *file, mask); });
     }
   }
-  for (const VersionDraft& draft : drafts) {
-    if (!draft.Incomplete(*shape)) MakeVersionCopy(v, draft);
+  for (const VersionDraft& draft : match.drafts) {
+    if (!draft.Incomplete(*match.shape)) MakeVersionCopy(v, draft);
   }
   return found;
+}
+
+void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
+                         const std::string& appFolder, const FingerprintFile& file, int16_t mask) {
+  OnError on{kClass, compare::kMatchVersionLabel};
+  on([&] {
+    match.c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
+                                         objResultsDOM->DocumentElement(), lngComputerCounter);
+  });
+  on([&] {
+    match.m =
+        Use(objSchema).AddDrive(record.Drive(), record.EncodedDrive(), match.c, lngDriveCounter);
+  });
+  on([&] {
+    Schema& schema = Use(objSchema);
+    match.d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), match.m, lngFolderCounter);
+  });
+  on([&] {
+    match.aResult = Use(objSchema).AddApplication(match.v.ParentNode(), match.d);
+    RememberCopy(match.aResult);
+  });
+  if (match.drafting && match.aResult) {
+    auto [at, added] = match.draftOf.try_emplace(match.aResult.Id(), match.drafts.size());
+    if (added) {
+      if (objResultsDOM->FindChild(match.aResult, vocab::v, vocab::v_id,
+                                   match.v.GetAttribute(vocab::v_id).value_or(""))) {
+        at->second = VersionMatch::kNoDraft;
+      } else {
+        if (!match.shape) match.shape.emplace(match.files);
+        match.drafts.emplace_back(match.aResult, match.files.size());
+      }
+    }
+    if (at->second != VersionMatch::kNoDraft) {
+      UpdateDraftDetails(match.drafts[at->second], *match.shape, file, mask);
+      return;
+    }
+  }
+  on([&] { match.vResult = Use(objSchema).AddVersion(match.v, match.aResult); });
+  on([&] { UpdateFileDetails(match.vResult, file, mask); });
 }
 
 void Compare::MakeVersionCopy(const xml::Node& v, const VersionDraft& draft) {
