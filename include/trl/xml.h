@@ -44,6 +44,8 @@ class Node {
   std::vector<Node> ChildNodes() const;
   // The child elements with this tag, in document order: "./tag" without the cost of a selection.
   std::vector<Node> ChildElements(std::string_view tag) const;
+  // How many child elements have this tag, counting no further than `limit`.
+  size_t CountChildElements(std::string_view tag, size_t limit = SIZE_MAX) const;
 
   // XPath 1.0 from this node. The result is a snapshot in document order: later changes to the
   // document do not change it. A bad expression fails with kInvalidArgument (5).

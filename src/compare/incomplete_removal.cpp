@@ -74,7 +74,7 @@ bool Compare::RemoveEmptiedCopy(const std::string& id) {
   if (copies == copiesById_.end() || id.find('\'') != std::string::npos) return false;
   xml::Node copy;
   for (const ApplicationCopy& candidate : copies->second) {
-    if (candidate.element.ChildElements(vocab::v).empty()) {
+    if (candidate.element.CountChildElements(vocab::v, 1) == 0) {
       copy = candidate.element;
       break;
     }
@@ -86,11 +86,15 @@ bool Compare::RemoveEmptiedCopy(const std::string& id) {
   xml::Node m = d.ParentNode();
   xml::Node c = m.ParentNode();
   xml::Node root = c.ParentNode();
-  if (d.ChildElements(vocab::a).size() != 1) {
+  // Counting stops at two: "exactly one" is all that is asked, and a drive may hold many folders.
+  auto one = [](const xml::Node& parent, std::string_view tag) {
+    return parent.CountChildElements(tag, 2) == 1;
+  };
+  if (!one(d, vocab::a)) {
     d.RemoveChild(copy);
-  } else if (m.ChildElements(vocab::d).size() != 1) {
+  } else if (!one(m, vocab::d)) {
     m.RemoveChild(d);
-  } else if (c.ChildElements(vocab::m).size() == 1 && root.ChildElements(vocab::c).size() == 1) {
+  } else if (one(c, vocab::m) && one(root, vocab::c)) {
     root.RemoveChild(c);
   } else {
     c.RemoveChild(m);

@@ -171,6 +171,17 @@ std::vector<Node> Node::ChildElements(std::string_view tag) const {
   return children;
 }
 
+size_t Node::CountChildElements(std::string_view tag, size_t limit) const {
+  pugi::xml_node node = Require(*this);
+  pugi::xml_node holder = document_->impl_->holder;
+  size_t count = 0;
+  for (pugi::xml_node child : node.children()) {
+    if (count == limit) break;
+    if (child.type() == pugi::node_element && child != holder && tag == child.name()) ++count;
+  }
+  return count;
+}
+
 Node Node::AppendChild(Node child) {
   pugi::xml_node node = Require(*this);
   Require(child);

@@ -339,6 +339,20 @@ TEST(XmlDocumentTest, DetachedNodesStayOutOfSight) {
   EXPECT_EQ(clone.Xml(), "<c id=\"1\"><m/></c>");
 }
 
+// What "./tag" selects, without a selection: direct children only, comments and text aside.
+TEST(XmlDocumentTest, ChildElementsByTag) {
+  Document doc;
+  Load(doc, "<r>t<a i='1'/><b/><a i='2'><a i='3'/></a><!--a--><a i='4'/></r>");
+  Node r = doc.DocumentElement();
+  std::vector<std::string> ids;
+  for (Node a : r.ChildElements("a")) ids.push_back(a.GetAttribute("i").value_or(""));
+  EXPECT_EQ(ids, (std::vector<std::string>{"1", "2", "4"}));
+  EXPECT_EQ(r.CountChildElements("a"), 3u);
+  EXPECT_EQ(r.CountChildElements("a", 2), 2u);
+  EXPECT_EQ(r.CountChildElements("b", 2), 1u);
+  EXPECT_EQ(r.CountChildElements("c"), 0u);
+}
+
 TEST(XmlDocumentTest, TextAndNames) {
   Document doc;
   Load(doc, "<r>a<b>b<![CDATA[c]]></b><!--z--><?p q?>d</r>");
