@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <tuple>
 #include <unordered_map>
 #include <unordered_set>
 #include <vector>
@@ -71,6 +72,9 @@ class Compare : public Worker {
   // Files the find of a local file for the version's file under its application folder.
   void RecordFind(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder,
                   const FingerprintFile& file, int16_t mask);
+  // The computer, drive, application folder and application copy of a find, found or added;
+  // false when a step failed.
+  bool FindPlace(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder);
   // Whether the application's copies will certainly be pruned once its versions are matched, so
   // that version copies can be drafted first and made only when complete.
   bool PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const;
@@ -113,6 +117,9 @@ class Compare : public Worker {
   int32_t lngFolderCounter = 0;
   std::string startTime_;  // formatted
   xml::Node draftsFor_;    // the application whose version copies are drafted, if any
+  // The places the application being matched was found in: its computer, drive, folder and copy.
+  std::unordered_map<std::string, std::tuple<xml::Node, xml::Node, xml::Node, xml::Node>>
+      placesFound_;
 
   // Every results copy of an application by a_id, so that pruning one application never scans
   // the whole results.

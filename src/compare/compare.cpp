@@ -1,6 +1,7 @@
 #include "trl/compare.h"
 
 #include <optional>
+#include <tuple>
 #include <unordered_set>
 
 #include "compare/compare_names.h"
@@ -133,11 +134,13 @@ bool Compare::MatchApplication(xml::Node a) {
   std::vector<xml::Node> versions;
   on([&] { versions = a.GetElementsByTagName(vocab::v); });
   draftsFor_ = PrunedAfterwards(a, versions) ? a : xml::Node();
+  placesFound_.clear();
   for (const xml::Node& v : versions) {
     on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
     if (MatchVersion(v)) found = true;
   }
   draftsFor_ = xml::Node();
+  placesFound_.clear();
   if (found) {
     int16_t remaining = 0;
     on([&] { remaining = RemoveIncompleteApplications(TextOf(a, vocab::a_id), highest); });
@@ -233,22 +236,16 @@ bool Compare::MatchVersion(xml::Node v) {
 void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
                          const std::string& appFolder, const FingerprintFile& file, int16_t mask) {
   OnError on{kClass, compare::kMatchVersionLabel};
-  on([&] {
-    match.c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
-                                         objResultsDOM->DocumentElement(), lngComputerCounter);
-  });
-  on([&] {
-    match.m =
-        Use(objSchema).AddDrive(record.Drive(), record.EncodedDrive(), match.c, lngDriveCounter);
-  });
-  on([&] {
-    Schema& schema = Use(objSchema);
-    match.d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), match.m, lngFolderCounter);
-  });
-  on([&] {
-    match.aResult = Use(objSchema).AddApplication(match.v.ParentNode(), match.d);
-    RememberCopy(match.aResult);
-  });
+  // While one application is matched the results only grow, so a place found once is found again
+  // by the same find-or-add steps, which add nothing and report nothing then.
+  std::string place = record.EncodedMachine() + '\0' + record.EncodedDrive() + '\0' + appFolder +
+                      '\0' + std::to_string(reinterpret_cast<uintptr_t>(match.v.ParentNode().Id()));
+  if (auto known = placesFound_.find(place); known != placesFound_.end()) {
+    std::tie(match.c, match.m, match.d, match.aResult) = known->second;
+  } else if (FindPlace(match, record, appFolder)) {
+    placesFound_.emplace(std::move(place),
+                         std::make_tuple(match.c, match.m, match.d, match.aResult));
+  }
   if (match.drafting && match.aResult) {
     auto [at, added] = match.draftOf.try_emplace(match.aResult.Id(), match.drafts.size());
     if (added) {
@@ -283,6 +280,28 @@ void Compare::MakeVersionCopy(const xml::Node& v, const VersionDraft& draft) {
   }
   vResult.SetAttribute(vocab::f_act, std::to_string(draft.filesFound));
   vResult.SetAttribute(vocab::v_act, std::to_string(draft.score));
+}
+
+bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
+                        const std::string& appFolder) {
+  OnError on{kClass, compare::kMatchVersionLabel};
+  bool found = on([&] {
+    match.c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
+                                         objResultsDOM->DocumentElement(), lngComputerCounter);
+  });
+  found &= on([&] {
+    match.m =
+        Use(objSchema).AddDrive(record.Drive(), record.EncodedDrive(), match.c, lngDriveCounter);
+  });
+  found &= on([&] {
+    Schema& schema = Use(objSchema);
+    match.d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), match.m, lngFolderCounter);
+  });
+  found &= on([&] {
+    match.aResult = Use(objSchema).AddApplication(match.v.ParentNode(), match.d);
+    RememberCopy(match.aResult);
+  });
+  return found;
 }
 
 std::string Compare::CandidatePath(const LocalFileRecord& record, const std::string& name) {
