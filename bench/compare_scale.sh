@@ -7,6 +7,9 @@
 #              (default: build)
 #   WORK_DIR   where the data sets go (default: /tmp/trl-compare-bench); kept between runs
 #   RUNS       environment: runs per scale, the best counts (default: 5)
+#   INSTRUCTIONS=1  environment: also count the instructions Compare executes at each scale, under
+#              valgrind (minutes at full scale); unlike time on a shared machine, the count does
+#              not move from run to run
 set -euo pipefail
 
 build_dir=$(realpath -m "${1:-build}")
@@ -19,7 +22,7 @@ for tool in make_compare_data compare_bench; do
   }
 done
 
-declare -A seconds
+declare -A seconds instructions
 for apps in 1000 10000; do
   data="$work_dir/apps-$apps"
   if [[ ! -f $data.done ]]; then
@@ -31,6 +34,17 @@ for apps in 1000 10000; do
   report=$("$build_dir/bench/compare_bench" "$data" "$runs")
   echo "$report"
   seconds[$apps]=$(sed -n 's/^compare best of [0-9]*: \([0-9.]*\) s.*/\1/p' <<<"$report")
+  if [[ ${INSTRUCTIONS:-0} == 1 ]]; then
+    command -v valgrind >/dev/null || { echo "valgrind is not installed" >&2; exit 1; }
+    instructions[$apps]=$(valgrind --tool=callgrind --callgrind-out-file=/dev/null \
+      --toggle-collect='trl::Compare::Start*' "$build_dir/bench/compare_bench" "$data" 1 2>&1 |
+      sed -n 's/.*Collected : \([0-9]*\).*/\1/p')
+    echo "instructions in Compare: ${instructions[$apps]}"
+  fi
 done
 awk -v a="${seconds[1000]}" -v b="${seconds[10000]}" \
   'BEGIN { printf "10x the input took %.1fx the time\n", b / a }'
+if [[ ${INSTRUCTIONS:-0} == 1 ]]; then
+  awk -v a="${instructions[1000]}" -v b="${instructions[10000]}" \
+    'BEGIN { printf "and %.1fx the instructions\n", b / a }'
+fi
