@@ -17,7 +17,7 @@ class LocalFileIndex;
 class FingerprintFile;
 struct LocalFileFacts;
 struct VersionDraft;
-struct VersionFiles;
+class VersionFiles;
 class LocalFileRecord;
 class Schema;
 namespace fs {

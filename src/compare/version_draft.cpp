@@ -44,18 +44,22 @@ bool CarriesWeight(const xml::Node& f) {
   return weight && XPathNumber(*weight) > 0;
 }
 
-VersionFiles::VersionFiles(const std::vector<xml::Node>& files) {
-  weighted.reserve(files.size());
+VersionFiles::VersionFiles(const std::vector<xml::Node>& files)
+    : files_(files), weighted_(files.size(), -1) {
   for (size_t i = 0; i < files.size(); ++i) {
     if (auto id = files[i].GetAttribute(vocab::f_id)) byId.try_emplace(*id, i);
-    weighted.push_back(CarriesWeight(files[i]));
   }
+}
+
+bool VersionFiles::Weighted(size_t i) const {
+  if (weighted_[i] < 0) weighted_[i] = CarriesWeight(files_[i]) ? 1 : 0;
+  return weighted_[i] == 1;
 }
 
 bool VersionDraft::Incomplete(const VersionFiles& files) const {
   if (static_cast<size_t>(filesFound) >= found.size()) return false;
   for (size_t i = 0; i < found.size(); ++i) {
-    if (!found[i] && files.weighted[i]) return true;
+    if (!found[i] && files.Weighted(i)) return true;
   }
   return false;
 }

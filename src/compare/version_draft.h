@@ -14,11 +14,20 @@ namespace trl {
 bool CarriesWeight(const xml::Node& f);
 
 // The files of one fingerprint version, as every results copy of the version holds them.
-struct VersionFiles {
+class VersionFiles {
+ public:
+  // `files` must outlive this object.
   explicit VersionFiles(const std::vector<xml::Node>& files);
 
   std::unordered_map<std::string, size_t> byId;  // f_id -> the first file with it
-  std::vector<bool> weighted;                    // CarriesWeight, per file
+
+  // CarriesWeight of file `i`, read when first asked: a copy is mostly judged incomplete by the
+  // first file it lacks.
+  bool Weighted(size_t i) const;
+
+ private:
+  const std::vector<xml::Node>& files_;
+  mutable std::vector<int8_t> weighted_;  // -1: not read yet
 };
 
 // The scores of a fingerprint version found under one results copy of its application, kept
