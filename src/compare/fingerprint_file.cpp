@@ -23,12 +23,14 @@ void Try(std::vector<std::exception_ptr>& failures, Read read) {
 
 }  // namespace
 
-FingerprintFile::FingerprintFile(const xml::Node& f) : f_(f), fit_(f) {
-  std::vector<xml::Node> properties = f.GetElementsByTagName(vocab::p);
-  properties_.reserve(properties.size());
+const std::vector<FingerprintFile::Property>& FingerprintFile::Properties() const {
+  if (properties_) return *properties_;
+  std::vector<Property>& read = properties_.emplace();
+  std::vector<xml::Node> properties = f_.GetElementsByTagName(vocab::p);
+  read.reserve(properties.size());
   int16_t kind = 0, weight = 0, bit = 0;
   for (const xml::Node& p : properties) {
-    Property& property = properties_.emplace_back();
+    Property& property = read.emplace_back();
     Try(property.readFailures, [&] { kind = ToInt16(TextOf(p, vocab::p_type)); });
     Try(property.readFailures, [&] { weight = ToInt16(TextOf(p, vocab::p_weight)); });
     Try(property.readFailures, [&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
@@ -49,10 +51,16 @@ FingerprintFile::FingerprintFile(const xml::Node& f) : f_(f), fit_(f) {
       property.conversionFailure = std::current_exception();
     }
   }
-  Details& details = details_;
-  Try(details.readFailures, [&] { details.id = ToInt32(TextOf(f, vocab::f_id)); });
-  Try(details.readFailures, [&] { details.maxMask = ToInt16(TextOf(f, vocab::p_max)); });
-  Try(details.readFailures, [&] { details.fileBit = ToInt16(TextOf(f, vocab::f_bitmask)); });
+  return read;
+}
+
+const FingerprintFile::Details& FingerprintFile::FindDetails() const {
+  if (details_) return *details_;
+  Details& details = details_.emplace();
+  Try(details.readFailures, [&] { details.id = ToInt32(TextOf(f_, vocab::f_id)); });
+  Try(details.readFailures, [&] { details.maxMask = ToInt16(TextOf(f_, vocab::p_max)); });
+  Try(details.readFailures, [&] { details.fileBit = ToInt16(TextOf(f_, vocab::f_bitmask)); });
+  return details;
 }
 
 }  // namespace trl

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <exception>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -11,9 +12,9 @@
 namespace trl {
 
 // A fingerprint file as the tests of its local candidates read it: where it expects to lie, its
-// properties, and what a find records. It is read once, since a file with a common name has many
-// candidates; each value that could not be read is reported again wherever a fresh read would
-// report it (Replay), and the value before it stands in, as it would.
+// properties, and what a find records. Each is read once, when first needed, since a file with a
+// common name has many candidates; each value that could not be read is reported again wherever a
+// fresh read would report it (Replay), and the value before it stands in, as it would.
 class FingerprintFile {
  public:
   // One property, read in order: its kind, its weight and the bit value of that weight (each
@@ -36,12 +37,13 @@ class FingerprintFile {
     int16_t fileBit = 0;
   };
 
-  explicit FingerprintFile(const xml::Node& f);
+  explicit FingerprintFile(const xml::Node& f) : f_(f), fit_(f) {}
 
   const xml::Node& Element() const { return f_; }
   const FolderFit& Fit() const { return fit_; }
-  const std::vector<Property>& Properties() const { return properties_; }
-  const Details& FindDetails() const { return details_; }
+  // Read when first asked for: most candidates of a common name lie in folders that do not fit.
+  const std::vector<Property>& Properties() const;
+  const Details& FindDetails() const;
 
   // Raises `failure` inside `on`, which reports it as the read that failed would have been.
   template <class Handler>
@@ -52,8 +54,8 @@ class FingerprintFile {
  private:
   xml::Node f_;
   FolderFit fit_;
-  std::vector<Property> properties_;
-  Details details_;
+  mutable std::optional<std::vector<Property>> properties_;
+  mutable std::optional<Details> details_;
 };
 
 }  // namespace trl
