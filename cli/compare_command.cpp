@@ -3,7 +3,6 @@
 #include <memory>
 #include <string>
 
-#include "command_error.h"
 #include "document_files.h"
 #include "stage_command.h"
 #include "trl/compare.h"
@@ -28,9 +27,7 @@ int RunCompare(const CompareOptions& options) {
   Compare compare(FileSystemWithShares(options.stage.shares));
   compare.Asynchronous(false);
   std::string text = compare.Start(applicationOptions, localFiles, fingerprint);
-  if (text.empty()) throw CommandError("the compare produced no document", kExitFailed);
-  WriteTextOutput(text, options.stage.output);
-  return kExitOk;
+  return WriteStageOutput(text, "compare", options.stage);
 }
 
 }  // namespace

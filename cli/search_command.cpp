@@ -3,7 +3,6 @@
 #include <memory>
 #include <string>
 
-#include "command_error.h"
 #include "document_files.h"
 #include "stage_command.h"
 #include "trl/search.h"
@@ -30,9 +29,7 @@ int RunSearch(const SearchOptions& options) {
   Search search(FileSystemWithShares(options.stage.shares));
   search.Asynchronous(false);
   std::string text = search.Start(searchOptions, applicationOptions, fingerprint, results);
-  if (text.empty()) throw CommandError("the search produced no document", kExitFailed);
-  WriteTextOutput(text, options.stage.output);
-  return kExitOk;
+  return WriteStageOutput(text, "search", options.stage);
 }
 
 }  // namespace

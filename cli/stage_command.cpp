@@ -5,6 +5,7 @@
 #include <cstdio>
 
 #include "command_error.h"
+#include "document_files.h"
 #include "frame/error_handler.h"
 #include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
@@ -22,6 +23,14 @@ void AddShareOption(CLI::App& command, StageOptions& options) {
 void AddOutputOption(CLI::App& command, StageOptions& options) {
   command.add_option("--output,-o", options.output,
                      "Write the result document to FILE instead of standard output");
+}
+
+int WriteStageOutput(const std::string& text, std::string_view stage, const StageOptions& options) {
+  if (text.empty()) {
+    throw CommandError(fmt::format("the {} produced no document", stage), kExitFailed);
+  }
+  WriteTextOutput(text, options.output);
+  return kExitOk;
 }
 
 std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::string>& shares) {

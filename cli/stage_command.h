@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "platform/fs/file_system.h"
@@ -17,6 +18,10 @@ struct StageOptions {
 
 void AddShareOption(CLI::App& command, StageOptions& options);
 void AddOutputOption(CLI::App& command, StageOptions& options);
+
+// Writes the document a stage's run gave to the output the options name; a run that gave none
+// failed (kExitFailed). Answers the command's exit code.
+int WriteStageOutput(const std::string& text, std::string_view stage, const StageOptions& options);
 
 // This machine's file system, with the given share mappings before the system's network mounts.
 // A malformed mapping is a CommandError.
