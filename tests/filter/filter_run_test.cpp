@@ -1,0 +1,92 @@
+// Asynchronous runs: what they report, in which order, and a cancel between applications.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <functional>
+
+#include "filter/filter_fixture.h"
+#include "platform/event_loop.h"
+
+namespace trl::testing {
+namespace {
+
+using ::testing::ElementsAre;
+using namespace std::chrono_literals;
+
+// What an asynchronous run reports: "S<e_status>:<e_match_total>/<e_match_count>" and
+// "P<a_name>:<e_match_total>/<e_match_count>", in order.
+class FilterRunTest : public FilterTest {
+ protected:
+  FilterRunTest() {
+    filter_.OnStatusUpdate([this](const std::string& update, const std::string& results) {
+      events_.push_back("S" + Counters(update, "e_status"));
+      lastResults_ = results;
+    });
+    filter_.OnProgressUpdate([this](const std::string& update) {
+      events_.push_back("P" + Counters(update, "a_name"));
+      if (events_.back() == cancelAt_) filter_.Cancel();
+      if (progressAttributes_.empty()) {
+        for (const auto& [name, value] : Parse(update)->DocumentElement().Attributes()) {
+          progressAttributes_.push_back(name);
+        }
+      }
+    });
+  }
+
+  static std::string Counters(const std::string& update, std::string_view first) {
+    auto document = Parse(update);
+    xml::Node e = document->DocumentElement();
+    return e.GetAttribute(first).value_or("?") + ":" +
+           e.GetAttribute("e_match_total").value_or("?") + "/" +
+           e.GetAttribute("e_match_count").value_or("?");
+  }
+
+  void RunToEnd(int16_t options, xml::DocumentPtr matches) {
+    EXPECT_EQ(filter_.Start(options, std::move(matches)), "");
+    ASSERT_TRUE(EventLoop::Current().RunUntil(
+        [&] { return filter_.Status() == kStatusComplete || filter_.Status() == kStatusCancelled; },
+        10s));
+  }
+
+  std::vector<std::string> events_;
+  std::vector<std::string> progressAttributes_;
+  std::string lastResults_;
+  std::string cancelAt_;
+};
+
+const std::string kOutside = Application("Outside", {Version("5 1 2 1 1"), Version("6 1 2 1 1")});
+
+std::string ThreeApplications() {
+  return Matches({Application("A", {Version("1 3 3 1 1"), Version("2 1 3 1 1")}),
+                  Application("B", {}), Application("C", {Version("3 3 3 1 1")})},
+                 kOutside);
+}
+
+TEST_F(FilterRunTest, ReportsEachApplicationLeftWithAVersionAndCountsEveryApplication) {
+  auto matches = Parse(ThreeApplications());
+  RunToEnd(LowWeights, matches);
+  EXPECT_THAT(events_, ElementsAre("S1:0/0", "S2:4/0", "PA:4/1", "PC:4/2", "S3:4/2"));
+  EXPECT_THAT(progressAttributes_,
+              ElementsAre("e_mode", "e_status", "a_name", "e_match_total", "e_match_count"));
+  EXPECT_EQ(filter_.Status(), kStatusComplete);
+  // Filtered in place; the application outside a computer, drive and folder is never visited.
+  EXPECT_EQ(lastResults_, matches->Xml());
+  EXPECT_THAT(ValuesOf(*matches, "//a", "v_id"), ElementsAre("1", "0", "3", "<absent>"));
+  EXPECT_EQ(matches->AsNode().SelectSingleNode("/*/a").Xml(), kOutside);
+}
+
+TEST_F(FilterRunTest, ACancelStopsBeforeTheNextApplicationAndTheLastReportFollows) {
+  auto matches = Parse(ThreeApplications());
+  cancelAt_ = "PA:4/1";
+  RunToEnd(LowWeights, matches);
+  EXPECT_THAT(events_, ElementsAre("S1:0/0", "S2:4/0", "PA:4/1", "S255:4/1"));
+  EXPECT_EQ(filter_.Status(), kStatusCancelled);
+  EXPECT_THAT(ValuesOf(*matches, "//a", "a_manage"),
+              ElementsAre("1", "<absent>", "<absent>", "<absent>"));
+  EXPECT_THAT(ValuesOf(*matches, "//a[@a_name='C']/v", "v_weight"), ElementsAre("<absent>"));
+  EXPECT_EQ(lastResults_, matches->Xml());
+}
+
+}  // namespace
+}  // namespace trl::testing
