@@ -50,6 +50,8 @@ const Case kCases[] = {
      "<a a_id='7' a_name='App' v_id='-1'><v v_id='3'/></a>", "1", "1", "0", ""},
 };
 
+void PrintTo(const Case& c, std::ostream* os) { *os << c.name; }
+
 class MergeApplicationTest : public ::testing::TestWithParam<Case> {};
 
 TEST_P(MergeApplicationTest, CarriesSettingsAndHistory) {

@@ -195,9 +195,13 @@ std::string SearchOptions(const Run& run, Generator& g) {
   for (const auto& [c, m, d, id] : run.managed) {
     // An id written with leading zeros is looked for as its number.
     std::string idText = (g.Chance(20) ? "00" : "") + std::to_string(id);
-    text += Managed("host" + std::to_string(c), std::string(1, 'c' + m) + ":",
-                    "\\f" + std::to_string(d) + "\\", idText);
+    std::string computer = "host" + std::to_string(c);
+    std::string drive = std::string(1, 'c' + m) + ":";
+    std::string folder = "\\f" + std::to_string(d) + "\\";
+    text += Managed(computer, drive, folder, idText);
     if (g.Chance(20)) text += Managed("host" + std::to_string(c), "c:", "\\f0\\", idText, "0");
+    // Checked twice: the second check must not find what the first one moved.
+    if (g.Chance(10)) text += Managed(computer, drive, folder, std::to_string(id));
   }
   return text + "</options>";
 }
@@ -213,7 +217,12 @@ xml::Node At(xml::Document& document, const App& app) {
                                             std::to_string(app.id) + "']");
 }
 
-void CheckRun(uint32_t seed) {
+// How often each outcome came up, so that the generator is seen to reach them all.
+struct Seen {
+  int kept = 0, replaced = 0, changed = 0, missing = 0, pruned = 0;
+};
+
+void CheckRun(uint32_t seed, Seen& seen) {
   SCOPED_TRACE("seed " + std::to_string(seed));
   Run run = Generate(seed);
   Generator g(seed ^ 0x5bd1e995u);
@@ -257,13 +266,18 @@ void CheckRun(uint32_t seed) {
       for (const xml::Node& v : now.SelectNodes("v_history/v"))
         actual.push_back(*v.GetAttribute("v_id"));
       EXPECT_EQ(actual, history) << "history of " << o.id;
+      ++seen.replaced;
+      if (actual.size() > o.history.size()) ++seen.changed;
     } else if (run.managed.count(key) && !run.rejected.count(o.id)) {
       EXPECT_FALSE(now) << "missing " << o.id;
       missing.insert(std::to_string(o.id));
+      ++seen.missing;
+      if (old->AsNode().CountNodes(Names(o.place)) == 0) ++seen.pruned;
     } else {
       ASSERT_TRUE(now) << "kept " << o.id;
       EXPECT_EQ(Content(now), before[key]);
       ++kept;
+      ++seen.kept;
     }
   }
   for (const App& n : run.fresh) {
@@ -289,9 +303,13 @@ void CheckRun(uint32_t seed) {
 }
 
 TEST(MergePropertyTest, EveryApplicationIsKeptReplacedOrMissing) {
+  Seen seen;
   for (uint32_t seed = 1; seed <= 1500; ++seed) {
-    CheckRun(seed);
+    CheckRun(seed, seen);
     if (HasFatalFailure() || HasNonfatalFailure()) break;
+  }
+  for (int count : {seen.kept, seen.replaced, seen.changed, seen.missing, seen.pruned}) {
+    EXPECT_GT(count, 100);
   }
 }
 

@@ -72,6 +72,8 @@ const Case kCases[] = {
      kTwoApps + "<a_missing><a a_id='3'/></a_missing>", "", "", "missing(3 7 8)"},
 };
 
+void PrintTo(const Case& c, std::ostream* os) { *os << c.name; }
+
 class MissingApplicationsTest : public ::testing::TestWithParam<Case> {};
 
 TEST_P(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
