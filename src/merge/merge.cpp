@@ -1,0 +1,210 @@
+#include "trl/merge.h"
+
+#include <algorithm>
+#include <vector>
+
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/fixes.h"
+#include "frame/general.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "merge/merge_names.h"
+#include "merge/place_index.h"
+#include "platform/convert.h"
+#include "schema/schema.h"
+
+namespace trl {
+
+using merge::kClass;
+
+namespace {
+
+constexpr int32_t kMergeMode = 4;
+
+xml::DocumentPtr EmptyResults() {
+  auto document = std::make_shared<xml::Document>();
+  document->SetDocumentElement(document->CreateElement(vocab::results_root));
+  return document;
+}
+
+// Every `tag` element of the document, as a selection of "//tag" from its root gives them.
+std::vector<xml::Node> EveryElement(xml::Document& document, std::string_view tag) {
+  if (!document.DocumentElement()) Fail(kObjectNotSet);
+  return document.AsNode().GetElementsByTagName(tag);
+}
+
+}  // namespace
+
+Merge::Merge()
+    : Worker(kClass, kMergeMode),
+      objSchema(
+          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+
+Merge::~Merge() = default;
+
+std::string Merge::Start(xml::DocumentPtr searchOptions, xml::DocumentPtr applicationOptions,
+                         xml::DocumentPtr oldResults, xml::DocumentPtr newResults) {
+  return StartFrame([&] { Prepare(searchOptions, applicationOptions, oldResults, newResults); });
+}
+
+void Merge::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicationOptions,
+                    xml::DocumentPtr& oldResults, xml::DocumentPtr& newResults) {
+  OnError on{kClass, merge::kStartLabel};
+  objSearchOptionsDOM = searchOptions ? searchOptions : std::make_shared<xml::Document>();
+  objApplicationOptionsDOM =
+      applicationOptions ? applicationOptions : std::make_shared<xml::Document>();
+  objOldResultsDOM = oldResults;
+  objNewResultsDOM = newResults;
+  on([&] {
+    if (!objOldResultsDOM) objOldResultsDOM = EmptyResults();
+  });
+  on([&] {
+    if (!objNewResultsDOM) objNewResultsDOM = EmptyResults();
+  });
+  newPlaces_.reset();
+  oldPlaces_.reset();
+  missingList_ = xml::Node();
+
+  // Read before the upgrade, which may rename but never renumbers.
+  SeedCounters();
+  on([&] { UpgradeUserData(Use(objOldResultsDOM)); });
+  on([&] { UpgradeUserData(Use(objNewResultsDOM)); });
+  CountApplications();
+}
+
+void Merge::SeedCounters() {
+  OnError on{kClass, merge::kStartLabel};
+  lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
+  bool empty = true;
+  on([&] { empty = Use(objOldResultsDOM).DocumentElement().FirstChild().IsNull(); });
+  if (empty) return;
+  struct Level {
+    std::string_view tag, id;
+    int32_t& counter;
+  };
+  for (const Level& level : {Level{vocab::c, vocab::c_id, lngComputerCounter},
+                             Level{vocab::m, vocab::m_id, lngDriveCounter},
+                             Level{vocab::d, vocab::d_id, lngFolderCounter}}) {
+    // The highest id in use, so that what the merge adds is numbered after it.
+    std::vector<xml::Node> elements;
+    on([&] { elements = EveryElement(*objOldResultsDOM, level.tag); });
+    std::optional<int32_t> highest;
+    for (const xml::Node& element : elements) {
+      on([&] {
+        int32_t id = ToInt32(TextOf(element, level.id));
+        highest = highest ? std::max(*highest, id) : id;
+      });
+    }
+    level.counter = highest.value_or(0);
+  }
+}
+
+void Merge::CountApplications() {
+  OnError on{kClass, merge::kStartLabel};
+  e_match_total_new = e_match_total_old = e_match_merged = e_match_missing = 0;
+  on([&] {
+    e_match_total_new =
+        ToInt32(static_cast<double>(EveryElement(*objNewResultsDOM, vocab::a).size()));
+  });
+  on([&] {
+    e_match_total_old =
+        ToInt32(static_cast<double>(EveryElement(*objOldResultsDOM, vocab::a).size()));
+  });
+}
+
+void Merge::RunBody() { Run(); }
+
+void Merge::Run() {
+  OnError on{kClass, merge::kMergeLabel};
+  BeginRun(on);
+  Defaults defaults;
+  xml::Node oldRoot;
+  on([&] { oldRoot = objOldResultsDOM->DocumentElement(); });
+  on([&] {
+    defaults.update = FixNulls(oldRoot.GetAttribute(vocab::a_update_q), std::string("1"));
+  });
+  on([&] { defaults.dupes = FixNulls(oldRoot.GetAttribute(vocab::a_dupes_q), std::string("1")); });
+  MissingApplicationsRefresh();
+  MissingApplicationsSearch();
+
+  std::vector<xml::Node> computers;
+  on([&] { computers = EveryElement(*objNewResultsDOM, vocab::c); });
+  // A find-or-add that fails leaves the element it last gave in use, as a failed step does.
+  xml::Node oldComputer, oldDrive, oldFolder;
+  bool going = true;
+  for (size_t ci = 0; going && ci < computers.size(); ++ci) {
+    const xml::Node& c = computers[ci];
+    on([&] {
+      oldComputer = Use(objSchema).AddComputer(TextOf(c, vocab::c_text), TextOf(c, vocab::c_name),
+                                               oldRoot, lngComputerCounter);
+    });
+    std::vector<xml::Node> drives;
+    on([&] { drives = c.ChildElements(vocab::m); });
+    for (size_t mi = 0; going && mi < drives.size(); ++mi) {
+      const xml::Node& m = drives[mi];
+      on([&] {
+        oldDrive = Use(objSchema).AddDrive(TextOf(m, vocab::m_text), TextOf(m, vocab::m_name),
+                                           oldComputer, lngDriveCounter);
+      });
+      std::vector<xml::Node> folders;
+      on([&] { folders = m.ChildElements(vocab::d); });
+      for (size_t di = 0; going && di < folders.size(); ++di) {
+        const xml::Node& d = folders[di];
+        on([&] {
+          oldFolder = Use(objSchema).AddFolder(TextOf(d, vocab::d_text), TextOf(d, vocab::d_name),
+                                               oldDrive, lngFolderCounter);
+        });
+        going = MergeFolder(d, oldFolder, defaults);
+      }
+    }
+  }
+  SettleStatus();
+  EndRun(on);
+}
+
+bool Merge::MergeFolder(xml::Node newFolder, xml::Node oldFolder, const Defaults& defaults) {
+  OnError on{kClass, merge::kMergeLabel};
+  std::vector<xml::Node> applications;
+  on([&] { applications = newFolder.ChildElements(vocab::a); });
+  std::string name;
+  for (const xml::Node& a : applications) {
+    // Read first: the merge moves the element into the old results.
+    on([&] { name = TextOf(a, vocab::a_name); });
+    MergeApplication(a, oldFolder, defaults);
+    on([&] { e_match_merged = CheckedAdd(e_match_merged, 1); });
+    RaiseApplicationProgress(name);
+    if (status_ == kStatusCancelled) return false;
+  }
+  return true;
+}
+
+void Merge::RaiseApplicationProgress(const std::string& name) {
+  Progress(OnError{kClass, merge::kMergeLabel}, [&](xml::Node e) {
+    e.SetAttribute(vocab::a_name, name);
+    AddStatusCounters(e);
+  });
+}
+
+std::string Merge::ResultText() { return Use(objOldResultsDOM).DocumentElement().Xml(); }
+
+std::string Merge::ResultsXml() { return objOldResultsDOM ? objOldResultsDOM->Xml() : ""; }
+
+void Merge::AddStatusCounters(xml::Node e) {
+  e.SetAttribute(vocab::e_match_total_new, std::to_string(e_match_total_new));
+  e.SetAttribute(vocab::e_match_total_old, std::to_string(e_match_total_old));
+  e.SetAttribute(vocab::e_match_merged, std::to_string(e_match_merged));
+  e.SetAttribute(vocab::e_match_missing, std::to_string(e_match_missing));
+}
+
+void Merge::ReleaseDocuments() {
+  newPlaces_.reset();
+  oldPlaces_.reset();
+  missingList_ = xml::Node();
+  objNewResultsDOM.reset();
+  objOldResultsDOM.reset();
+  objSearchOptionsDOM.reset();
+  objApplicationOptionsDOM.reset();
+}
+
+}  // namespace trl

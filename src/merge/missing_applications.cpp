@@ -1,0 +1,115 @@
+#include "frame/attributes.h"
+#include "frame/error_handler.h"
+#include "frame/use_object.h"
+#include "frame/vocabulary.h"
+#include "merge/merge_names.h"
+#include "merge/place_index.h"
+#include "platform/convert.h"
+#include "schema/schema.h"
+#include "trl/merge.h"
+
+namespace trl {
+
+bool Merge::MissingApplicationsRefresh() {
+  OnError on{merge::kClass, merge::kRefreshLabel};
+  std::vector<xml::Node> managed;
+  on([&] {
+    managed = Use(objSearchOptionsDOM).DocumentElement().SelectNodes("//a[@a_manage='1']");
+  });
+  if (managed.empty()) return true;
+  on([&] { newPlaces_ = std::make_unique<merge::PlaceIndex>(Use(objNewResultsDOM)); });
+  on([&] { oldPlaces_ = std::make_unique<merge::PlaceIndex>(Use(objOldResultsDOM)); });
+
+  // A value that cannot be read keeps what the application before gave.
+  int32_t id = 0;
+  xml::Node folder, drive, computer;
+  std::string folderName, driveName, computerName;
+  for (xml::Node a : managed) {
+    bool selected = false;
+    on([&] { selected = Use(objSchema).IsApplicationSelected(a, *objApplicationOptionsDOM); });
+    if (!selected) continue;
+    on([&] { id = ToInt32(TextOf(a, vocab::a_id)); });
+    on([&] { folder = a.ParentNode(); });
+    on([&] { drive = folder.ParentNode(); });
+    on([&] { computer = drive.ParentNode(); });
+    on([&] { folderName = TextOf(folder, vocab::d_name); });
+    on([&] { driveName = TextOf(drive, vocab::m_name); });
+    on([&] { computerName = TextOf(computer, vocab::c_name); });
+
+    std::string idText = std::to_string(id);
+    xml::Node found;
+    on([&] { found = Use(newPlaces_).Find(computerName, driveName, folderName, idText); });
+    if (found) continue;  // found again at its place
+    xml::Node old;
+    on([&] { old = Use(oldPlaces_).Find(computerName, driveName, folderName, idText); });
+    if (old) MissingApplication(old);
+  }
+  // The merge moves applications around: the places are only good for this check.
+  newPlaces_.reset();
+  oldPlaces_.reset();
+  return true;
+}
+
+bool Merge::MissingApplicationsSearch() { return true; }
+
+xml::Node Merge::MissingList() {
+  xml::Node root = Use(objOldResultsDOM).DocumentElement();
+  // The list is only ever appended to the root, so once found it stays the first one there.
+  if (missingList_ && missingList_.ParentNode() == root) return missingList_;
+  std::vector<xml::Node> lists = root.ChildElements(vocab::a_missing_list);
+  missingList_ = lists.empty()
+                     ? root.AppendChild(objOldResultsDOM->CreateElement(vocab::a_missing_list))
+                     : lists.front();
+  return missingList_;
+}
+
+bool Merge::MissingApplication(xml::Node& application) {
+  OnError on{merge::kClass, merge::kMissingLabel};
+  bool selected = false;
+  on([&] {
+    selected = Use(objSchema).IsApplicationSelected(application, *objApplicationOptionsDOM);
+  });
+  if (!selected) return false;
+
+  xml::Node list;
+  on([&] { list = MissingList(); });
+  std::string name;
+  on([&] { name = TextOf(application, vocab::a_name); });
+  on([&] { application.SetAttribute(vocab::a_manage, "0"); });
+  on([&] { application.SetAttribute(vocab::a_missing, "1"); });
+  on([&] { list.AppendChild(application.CloneNode(false)); });
+
+  // Out of the tree, with the folder, drive and (when it is the only one) computer it leaves
+  // empty: the highest level that empties goes, taking the rest with it.
+  on([&] {
+    xml::Node folder = application.ParentNode();
+    xml::Node drive = folder.ParentNode();
+    xml::Node computer = drive.ParentNode();
+    xml::Node root = objOldResultsDOM->DocumentElement();
+    merge::PlaceIndex& places = Use(oldPlaces_);
+    places.Forget(application);
+    bool folderEmpties = folder.CountChildElements(vocab::a, 2) == 1;
+    bool driveEmpties = folderEmpties && drive.CountChildElements(vocab::d, 2) == 1;
+    bool computerGoes =
+        driveEmpties && computer.CountChildElements(vocab::m, 2) == 1 && places.Computers() == 1;
+    if (computerGoes) {
+      root.RemoveChild(computer);
+      places.ComputerRemoved();
+    } else if (driveEmpties) {
+      computer.RemoveChild(drive);
+    } else if (folderEmpties) {
+      drive.RemoveChild(folder);
+    } else {
+      folder.RemoveChild(application);
+    }
+  });
+  on([&] { e_match_missing = CheckedAdd(e_match_missing, 1); });
+
+  Progress(on, [&](xml::Node e) {
+    e.SetAttribute(vocab::a_name, name);
+    AddStatusCounters(e);
+  });
+  return true;
+}
+
+}  // namespace trl

@@ -1,0 +1,42 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "trl/xml.h"
+
+namespace trl::merge {
+
+// The applications of a results document by their place, the encoded names of their computer,
+// drive and folder and their a_id text: the answers of the selection
+// "//c[@c_name='C']/m[@m_name='M']/d[@d_name='D']/a[@a_id='A']" from the document's root, built
+// in one walk so that looking up many places never scans the whole document again.
+class PlaceIndex {
+ public:
+  explicit PlaceIndex(xml::Document& document);
+
+  // The first application at the place in document order, or no object. Fails as the selection
+  // would: kObjectNotSet (91) without a root element; names holding an apostrophe change the
+  // selection's meaning, so they are answered by the selection itself.
+  xml::Node Find(const std::string& computer, const std::string& drive, const std::string& folder,
+                 const std::string& id);
+  // Takes an application out of the index; call before it leaves the tree.
+  void Forget(const xml::Node& application);
+
+  // How many computers the document holds ("//c" counted), counted on first use.
+  size_t Computers();
+  void ComputerRemoved();
+
+ private:
+  // The place key of an application, or nothing when it stands where no place selection meets it.
+  static std::optional<std::string> KeyOf(const xml::Node& application);
+
+  xml::Document& document_;
+  std::unordered_map<std::string, std::vector<xml::Node>> byPlace_;
+  std::optional<size_t> computers_;
+};
+
+}  // namespace trl::merge

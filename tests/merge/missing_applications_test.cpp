@@ -1,0 +1,110 @@
+// Managed applications no longer found at their place move to the missing list.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "merge/merge_fixture.h"
+
+namespace trl::testing {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+std::string App(std::string_view id) {
+  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
+         "' a_manage='1' v_id='1'><v v_id='1'/></a>";
+}
+
+struct Case {
+  const char* name;
+  std::string searchOptions;  // the body under the options root
+  std::string oldResults;     // the body under the results root
+  std::string newResults;
+  const char* applicationOptions;
+  const char* shape;  // of the old results afterwards
+};
+
+const std::string kHostC = Place("Host", "C:", "\\App\\", App("7"));
+const std::string kTwoApps = Place("Host", "C:", "\\App\\", App("7") + App("8"));
+
+const Case kCases[] = {
+    {"FoundAgainAtItsPlaceStays", Managed("host", "c:", "\\app\\", "7"), kHostC, kHostC, "",
+     "c1(m1(d1(a7)))"},
+    {"OnlyApplicationTakesTheComputerWithIt", Managed("host", "c:", "\\app\\", "7"), kHostC, "", "",
+     "missing(7)"},
+    {"AnIdWrittenWithZerosIsLookedUpAsItsNumber", Managed("host", "c:", "\\app\\", "007"), kHostC,
+     "", "", "missing(7)"},
+    {"AnOldIdWrittenWithZerosIsNotFound", Managed("host", "c:", "\\app\\", "7"),
+     Place("Host", "C:", "\\App\\", App("007")), "", "", "c1(m1(d1(a007)))"},
+    {"OtherApplicationsOfTheFolderStay", Managed("host", "c:", "\\app\\", "8"), kTwoApps, "", "",
+     "c1(m1(d1(a7))) missing(8)"},
+    {"AnotherComputerKeepsTheEmptiedOneInPlace", Managed("host", "c:", "\\app\\", "7"),
+     kHostC + Place("Other", "C:", "\\App\\", App("9"), "2 2 2"), "", "",
+     "c1() c2(m2(d2(a9))) missing(7)"},
+    {"AFolderOfADriveWithOthersGoesAlone", Managed("host", "c:", "\\app\\", "7"),
+     "<c c_id='1' c_text='Host' c_name='host'><m m_id='1' m_text='C:' m_name='c:'>"
+     "<d d_id='1' d_text='\\App\\' d_name='\\app\\'>" +
+         App("7") +
+         "</d>"
+         "<d d_id='2' d_text='\\Tool\\' d_name='\\tool\\'>" +
+         App("9") + "</d></m></c>",
+     "", "", "c1(m1(d2(a9))) missing(7)"},
+    {"ADriveOfAComputerWithOthersGoesAlone", Managed("host", "c:", "\\app\\", "7"),
+     "<c c_id='1' c_text='Host' c_name='host'><m m_id='1' m_text='C:' m_name='c:'>"
+     "<d d_id='1' d_text='\\App\\' d_name='\\app\\'>" +
+         App("7") +
+         "</d></m>"
+         "<m m_id='2' m_text='D:' m_name='d:'><d d_id='2' d_text='\\App\\' d_name='\\app\\'>" +
+         App("9") + "</d></m></c>",
+     "", "", "c1(m2(d2(a9))) missing(7)"},
+    {"UnmanagedIsNotChecked", Managed("host", "c:", "\\app\\", "7", "true"), kHostC, "", "",
+     "c1(m1(d1(a7)))"},
+    {"AbsentFromBothChangesNothing", Managed("host", "c:", "\\app\\", "5"), kHostC, kHostC, "",
+     "c1(m1(d1(a7)))"},
+    {"RejectedInTheOptionsIsNeverMoved", Managed("host", "c:", "\\app\\", "7"), kHostC, "",
+     "<a a_id='7' a_selected='0'/>", "c1(m1(d1(a7)))"},
+    {"RejectedAsFoundInTheResultsIsNeverMoved", Managed("host", "c:", "\\app\\", "007"), kHostC, "",
+     "<a a_id='7' a_selected='0'/>", "c1(m1(d1(a7)))"},
+    {"MovedToAnotherFolderLeavesTheOldPlace", Managed("host", "c:", "\\app\\", "7"), kHostC,
+     Place("Host", "C:", "\\New\\", App("7")), "", "missing(7) c2(m2(d2(a7)))"},
+    {"SecondMissingJoinsTheList",
+     Managed("host", "c:", "\\app\\", "7") + Managed("host", "c:", "\\app\\", "8"),
+     kTwoApps + "<a_missing><a a_id='3'/></a_missing>", "", "", "missing(3 7 8)"},
+};
+
+void PrintTo(const Case& c, std::ostream* os) { *os << c.name; }
+
+class MissingApplicationsTest : public ::testing::TestWithParam<Case> {};
+
+TEST_P(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
+  const Case& c = GetParam();
+  auto old = Parse(Results(c.oldResults));
+  MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
+           Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
+           Parse(Results(c.newResults)));
+  EXPECT_THAT(TakeReportedEvents(), IsEmpty());
+  EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
+  for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
+    EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
+    EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
+    EXPECT_TRUE(copy.ChildNodes().empty()) << "copies are shallow";
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(Cases, MissingApplicationsTest, ::testing::ValuesIn(kCases),
+                         [](const auto& info) { return std::string(info.param.name); });
+
+TEST(MissingListTest, IsMadeOnceAsTheRootsLastChild) {
+  auto old = Parse(Results(Place("Host", "C:", "\\App\\", App("7") + App("8")) +
+                           Place("Other", "C:", "\\App\\", App("9"), "2 2 2")));
+  MergeNow(Parse("<o>" + Managed("host", "c:", "\\app\\", "7") +
+                 Managed("other", "c:", "\\app\\", "9") + "</o>"),
+           nullptr, old, nullptr);
+  auto root = old->DocumentElement();
+  auto children = root.ChildNodes();
+  EXPECT_EQ(children.back().NodeName(), "a_missing");
+  EXPECT_EQ(Shape(root), "c1(m1(d1(a8))) c2() missing(7 9)");
+}
+
+}  // namespace
+}  // namespace trl::testing
