@@ -6,6 +6,7 @@
 #include "command_error.h"
 #include "compare_command.h"
 #include "filter_command.h"
+#include "locate_command.h"
 #include "merge_command.h"
 #include "search_command.h"
 #include "version.h"
@@ -18,7 +19,8 @@ int main(int argc, char** argv) {
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
       "2 a bad command line or input document.");
   std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app),
-                                             AddFilterCommand(app), AddMergeCommand(app)};
+                                             AddFilterCommand(app), AddMergeCommand(app),
+                                             AddLocateCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {

@@ -47,8 +47,11 @@ std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::stri
   return fs::CreatePosixFileSystem(std::move(table));
 }
 
-ReportPrinter::ReportPrinter() {
-  ObserveReports([](const ReportedEventView& event) {
+ReportPrinter::ReportPrinter(std::function<void()> beforePrint) {
+  ObserveReports([beforePrint = std::move(beforePrint)](const ReportedEventView& event) {
+    if (beforePrint && (event.kind == Reporter::kWarning || event.kind == Reporter::kFailure)) {
+      beforePrint();
+    }
     if (event.kind == Reporter::kWarning) {
       fmt::print(stderr, "trllocator: warning: {}\n", event.description);
     } else if (event.kind == Reporter::kFailure) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <CLI/CLI.hpp>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -27,10 +28,11 @@ int WriteStageOutput(const std::string& text, std::string_view stage, const Stag
 // A malformed mapping is a CommandError.
 std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::string>& shares);
 
-// Prints each warning and failure the stages report to standard error while it lives.
+// Prints each warning and failure the stages report to standard error while it lives, each after
+// calling `beforePrint` (which can clear a status line).
 class ReportPrinter {
  public:
-  ReportPrinter();
+  explicit ReportPrinter(std::function<void()> beforePrint = {});
   ~ReportPrinter();
   ReportPrinter(const ReportPrinter&) = delete;
   ReportPrinter& operator=(const ReportPrinter&) = delete;

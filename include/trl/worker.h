@@ -61,6 +61,8 @@ class Worker {
   virtual void AddStatusCounters(xml::Node e) = 0;
   virtual void ReleaseDocuments() = 0;
   virtual bool YieldsInStart() const { return true; }
+  // Called by the asynchronous Start right after it armed the ticker.
+  virtual void TickerArmed() {}
 
   // Pieces of a run body, reported under the body's own label.
   void BeginRun(const OnError& on);  // status 2, first report
@@ -75,6 +77,11 @@ class Worker {
   void RaiseStatusUpdate();
   void RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill);
   xml::Node NewProgressElement();
+  // The same with texts made elsewhere (a relay of another worker's reports).
+  void RaiseStatusUpdate(const std::string& update, const std::string& results);
+  void RaiseProgressUpdate(const std::string& update);
+  // The e_mode of the progress elements this worker makes from now on.
+  void ProgressMode(int32_t mode) { mode_ = mode; }
 
   // Creates a service object at instance creation; a creation that fails is reported, then
   // reported again as "Unable to create an instance of <progId>", and the worker lives without it.

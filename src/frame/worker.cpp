@@ -44,6 +44,7 @@ std::string Worker::StartSteps(const std::function<void()>& prepare) {
     on([&] { RaiseStatusUpdate(); });
     if (YieldsInStart()) on([&] { Yield(); });
     on([&] { ArmTicker(); });
+    TickerArmed();
     return "";
   }
   std::string result;
@@ -120,15 +121,21 @@ void Worker::RaiseStatusUpdate() {
   if (!asynchronous_) return;
   AddStatusCounters(NewProgressElement());
   std::string update = progress_->Xml();
-  std::string results = ResultsXml();
-  if (statusUpdate_) statusUpdate_(update, results);
+  RaiseStatusUpdate(update, ResultsXml());
+}
+
+void Worker::RaiseStatusUpdate(const std::string& update, const std::string& results) {
+  if (asynchronous_ && statusUpdate_) statusUpdate_(update, results);
+}
+
+void Worker::RaiseProgressUpdate(const std::string& update) {
+  if (asynchronous_ && progressUpdate_) progressUpdate_(update);
 }
 
 void Worker::RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill) {
   if (!asynchronous_) return;
   fill(NewProgressElement());
-  std::string update = progress_->Xml();
-  if (progressUpdate_) progressUpdate_(update);
+  RaiseProgressUpdate(progress_->Xml());
 }
 
 void Worker::LastResort(const std::function<void()>& steps) {

@@ -94,7 +94,7 @@ TEST_F(FilterRulesTest, RulesKeepAndLabelVersionsAndTheApplicationTakesTheVerdic
   for (const Case& c : cases) {
     SCOPED_TRACE(Joined(c.versions) + " options " + std::to_string(c.options));
     std::vector<std::string> versions;
-    for (const std::string& spec : c.versions) versions.push_back(Version(spec));
+    for (const std::string& text : c.versions) versions.push_back(Version(text));
     auto document = Run(c.options, Matches({Application("A", versions)}));
     EXPECT_EQ(Joined(ValuesOf(*document, "//a/v", "v_id")), c.left);
     std::string guesses = c.guesses;

@@ -1,0 +1,187 @@
+#include "findings_table.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <array>
+#include <functional>
+#include <set>
+#include <tuple>
+#include <unordered_map>
+
+#include "frame/vocabulary.h"
+
+namespace trl::cli {
+namespace {
+
+constexpr std::string_view kUnidentified = "-1";
+
+std::string Attribute(const xml::Node& node, std::string_view name) {
+  return node.GetAttribute(name).value_or("");
+}
+
+// Folders are kept with "\" separators; a person on this system reads "/".
+std::string Readable(std::string path) {
+  std::replace(path.begin(), path.end(), '\\', '/');
+  return path;
+}
+
+// Calls `visit` with the computer, drive, folder and application of every application filed in
+// the inventory's tree (the missing list is not part of it).
+void ForEachApplication(
+    xml::Document& document,
+    const std::function<void(xml::Node c, xml::Node m, xml::Node d, xml::Node a)>& visit) {
+  xml::Node root = document.DocumentElement();
+  if (!root) return;
+  for (xml::Node c : root.ChildElements(vocab::c)) {
+    for (xml::Node m : c.ChildElements(vocab::m)) {
+      for (xml::Node d : m.ChildElements(vocab::d)) {
+        for (xml::Node a : d.ChildElements(vocab::a)) visit(c, m, d, a);
+      }
+    }
+  }
+}
+
+std::string Key(const xml::Node& c, const xml::Node& m, const xml::Node& d, const xml::Node& a) {
+  return fmt::format("{}\n{}\n{}\n{}", Attribute(c, vocab::c_name), Attribute(m, vocab::m_name),
+                     Attribute(d, vocab::d_name), Attribute(a, vocab::a_id));
+}
+
+size_t MissingCount(xml::Document& document) {
+  xml::Node root = document.DocumentElement();
+  if (!root) return 0;
+  size_t count = 0;
+  for (xml::Node list : root.ChildElements(vocab::a_missing_list)) {
+    count += list.ChildElements(vocab::a).size();
+  }
+  return count;
+}
+
+// Version names of the fingerprint by application and version id, for naming best guesses.
+class VersionNames {
+ public:
+  explicit VersionNames(xml::Document& fingerprint) {
+    for (xml::Node a : fingerprint.AsNode().GetElementsByTagName(vocab::a)) {
+      std::string application = Attribute(a, vocab::a_id);
+      for (xml::Node v : a.ChildElements(vocab::v)) {
+        names_.emplace(application + "\n" + Attribute(v, vocab::v_id), Attribute(v, vocab::v_name));
+      }
+    }
+  }
+  std::string Of(const std::string& application, const std::string& version) const {
+    auto found = names_.find(application + "\n" + version);
+    return found != names_.end() ? found->second : "version id " + version;
+  }
+
+ private:
+  std::unordered_map<std::string, std::string> names_;
+};
+
+std::string VersionText(const xml::Node& a, const VersionNames& names) {
+  std::string id = Attribute(a, vocab::v_id);
+  if (id == "0") return "no version matched";
+  if (id != kUnidentified) return Attribute(a, vocab::v_name);
+  std::string guess;
+  for (xml::Node v : a.ChildElements(vocab::v)) {
+    guess = Attribute(v, vocab::v_guess);
+    if (!guess.empty()) break;
+  }
+  if (guess.empty()) return "unidentified";
+  return "unidentified (best guess " + names.Of(Attribute(a, vocab::a_id), guess) + ")";
+}
+
+}  // namespace
+
+Inventory::Inventory(xml::Document& userData) : missing_(MissingCount(userData)) {
+  ForEachApplication(userData, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
+    entries_.emplace(Key(c, m, d, a),
+                     Entry{Attribute(c, vocab::c_text),
+                           Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
+                           Attribute(a, vocab::a_name), Attribute(a, vocab::v_id),
+                           Attribute(a, vocab::v_name), Attribute(a, vocab::a_id)});
+  });
+}
+
+std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fingerprint) const {
+  VersionNames names(fingerprint);
+  std::vector<Finding> findings;
+  std::set<std::string> present;
+  ForEachApplication(merged, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
+    std::string key = Key(c, m, d, a);
+    present.insert(key);
+    Finding finding{Attribute(c, vocab::c_text),
+                    Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text)),
+                    Attribute(a, vocab::a_name), VersionText(a, names), ""};
+    auto before = entries_.find(key);
+    std::string id = Attribute(a, vocab::v_id);
+    if (before == entries_.end()) {
+      finding.change = "new";
+    } else if (before->second.versionId != id) {
+      finding.change = (id == kUnidentified ? "no longer identified, was " : "updated from ") +
+                       before->second.versionName;
+    }
+    findings.push_back(std::move(finding));
+  });
+
+  // Applications this run moved to the missing list are no longer in the tree.
+  std::multiset<std::string> gone;
+  xml::Node root = merged.DocumentElement();
+  size_t seen = 0;
+  if (root) {
+    for (xml::Node list : root.ChildElements(vocab::a_missing_list)) {
+      for (xml::Node a : list.ChildElements(vocab::a)) {
+        if (seen++ >= missing_) gone.insert(Attribute(a, vocab::a_id));
+      }
+    }
+  }
+  for (const auto& [key, entry] : entries_) {
+    if (present.count(key) != 0) continue;
+    auto match = gone.find(entry.applicationId);
+    if (match == gone.end()) continue;
+    gone.erase(match);
+    findings.push_back(Finding{entry.computer, Readable(entry.folder), entry.application,
+                               entry.versionName, "missing"});
+  }
+
+  std::sort(findings.begin(), findings.end(), [](const Finding& x, const Finding& y) {
+    return std::tie(x.computer, x.folder, x.application) <
+           std::tie(y.computer, y.folder, y.application);
+  });
+  return findings;
+}
+
+std::string FindingsTable(const std::vector<Finding>& findings) {
+  const std::array<std::string, 5> heading{"COMPUTER", "FOLDER", "APPLICATION", "VERSION",
+                                           "CHANGE"};
+  std::array<size_t, 5> width{};
+  auto fields = [](const Finding& f) {
+    return std::array<const std::string*, 5>{&f.computer, &f.folder, &f.application, &f.version,
+                                             &f.change};
+  };
+  for (size_t i = 0; i < heading.size(); ++i) width[i] = heading[i].size();
+  for (const Finding& finding : findings) {
+    auto row = fields(finding);
+    for (size_t i = 0; i < row.size(); ++i) width[i] = std::max(width[i], row[i]->size());
+  }
+
+  std::string table;
+  auto line = [&](const std::array<const std::string*, 5>& row) {
+    std::string text;
+    for (size_t i = 0; i < row.size(); ++i) {
+      text += i + 1 < row.size() ? fmt::format("{:<{}}  ", *row[i], width[i]) : *row[i];
+    }
+    while (!text.empty() && text.back() == ' ') text.pop_back();
+    table += text + "\n";
+  };
+  line({&heading[0], &heading[1], &heading[2], &heading[3], &heading[4]});
+  size_t changed = 0;
+  for (const Finding& finding : findings) {
+    line(fields(finding));
+    changed += !finding.change.empty();
+  }
+  table += fmt::format("{} application{} listed, {} changed since the last run\n", findings.size(),
+                       findings.size() == 1 ? "" : "s", changed);
+  return table;
+}
+
+}  // namespace trl::cli

@@ -1,0 +1,238 @@
+#include "locate_command.h"
+
+#include <fmt/format.h>
+
+#include <filesystem>
+#include <memory>
+#include <string>
+
+#include "atomic_file.h"
+#include "command_error.h"
+#include "document_files.h"
+#include "filter_names.h"
+#include "findings_table.h"
+#include "frame/vocabulary.h"
+#include "interrupt.h"
+#include "live_progress.h"
+#include "platform/event_loop.h"
+#include "stage_command.h"
+#include "trl/locate.h"
+
+namespace trl::cli {
+namespace {
+
+constexpr const char* kExamplesDir = TRL_EXAMPLES_DIR;
+
+struct LocateOptions {
+  std::string searchOptions, applicationOptions, fingerprint, userData, log;
+  std::string filter = "all";
+  std::string format = "xml";
+  bool save = false;
+  bool sync = false;
+  StageOptions stage;
+};
+
+struct Documents {
+  xml::DocumentPtr searchOptions, applicationOptions, fingerprint, userData;
+};
+
+// How a run ended, and the last results it delivered.
+struct Outcome {
+  bool complete = false;
+  bool cancelled = false;
+  int stage = 0;  // where a cancelled run stopped
+  std::string results;
+};
+
+Documents LoadDocuments(const LocateOptions& options) {
+  if (options.searchOptions.empty() && options.applicationOptions.empty() &&
+      options.fingerprint.empty() && options.userData.empty()) {
+    auto example = [](const char* name) {
+      std::string path = (std::filesystem::path(kExamplesDir) / name).string();
+      if (!std::filesystem::exists(path)) {
+        throw CommandError(fmt::format(
+            "the bundled example is not at '{}': name the documents with --search-options, "
+            "--fingerprint and the other document options",
+            path));
+      }
+      return path;
+    };
+    return {LoadDocumentFile(example("search-options.xml"), "search options"),
+            LoadDocumentFile(example("application-options.xml"), "application options"),
+            LoadDocumentFile(example("fingerprint.xml"), "fingerprint database"), nullptr};
+  }
+  return {LoadOptionalDocumentFile(options.searchOptions, "search options"),
+          LoadOptionalDocumentFile(options.applicationOptions, "application options"),
+          LoadOptionalDocumentFile(options.fingerprint, "fingerprint database"),
+          LoadOptionalDocumentFile(options.userData, "user data")};
+}
+
+int Attribute(const std::string& updateXml, std::string_view name) {
+  xml::Document update;
+  if (!update.LoadXml(updateXml)) return -1;
+  auto value = update.DocumentElement().GetAttribute(name);
+  return value ? std::atoi(value->c_str()) : -1;
+}
+
+Outcome RunSynchronously(Locate& locate, const Documents& documents, int16_t filter) {
+  Outcome outcome;
+  outcome.results = locate.Start(documents.searchOptions, documents.applicationOptions, filter,
+                                 documents.fingerprint, documents.userData);
+  outcome.complete = locate.Mode() == Locate::kFinished && locate.Status() == kStatusComplete;
+  return outcome;
+}
+
+// Runs on this thread's event loop, with live progress and Ctrl-C turned into Cancel.
+Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t filter,
+                          LiveProgress& progress) {
+  InterruptGuard interrupt;
+  Outcome outcome;
+  bool ended = false;
+  // A Cancel reaches a stage only while it runs, so the request is repeated at every report (the
+  // first that finds a stage running stops it) and on a timer.
+  auto cancelIfAsked = [&] {
+    if (InterruptGuard::Requested() && !ended) locate.Cancel();
+  };
+  locate.OnStatusUpdate([&](const std::string& update, const std::string& results) {
+    progress.Update(update);
+    int mode = Attribute(update, vocab::e_mode);
+    int status = Attribute(update, vocab::e_status);
+    if (status == kStatusCancelled || (mode == Locate::kFinished && status == kStatusComplete)) {
+      ended = true;
+      outcome.complete = status == kStatusComplete;
+      outcome.cancelled = status == kStatusCancelled;
+      outcome.stage = mode;
+      outcome.results = results;
+    }
+    cancelIfAsked();
+  });
+  locate.OnProgressUpdate([&](const std::string& update) {
+    progress.Update(update);
+    cancelIfAsked();
+  });
+  Timer watch([&] {
+    progress.Tick();
+    cancelIfAsked();
+  });
+  watch.Interval(100);
+  watch.Enabled(true);
+
+  locate.Start(documents.searchOptions, documents.applicationOptions, filter, documents.fingerprint,
+               documents.userData);
+  EventLoop::Current().RunUntil([&] { return ended; });
+  locate.OnStatusUpdate(nullptr);
+  locate.OnProgressUpdate(nullptr);
+  if (InterruptGuard::Requested() && !outcome.cancelled) {
+    outcome.cancelled = true;
+    outcome.stage = locate.Mode();
+  }
+  return outcome;
+}
+
+const char* StageName(int mode) {
+  static const char* const names[] = {"start", "search", "compare", "filter", "merge", "final"};
+  return mode >= 0 && mode <= Locate::kFinished ? names[mode] : "unknown";
+}
+
+std::string WithoutLastLineEnd(std::string text) {
+  if (!text.empty() && text.back() == '\n') text.pop_back();
+  return text;
+}
+
+int RunLocate(const LocateOptions& options) {
+  if (options.save && options.userData.empty()) {
+    throw CommandError("--save needs the user data to save: give --user-data FILE");
+  }
+  int16_t filter = ParseFilterOptions(options.filter);
+  Documents documents = LoadDocuments(options);
+  std::unique_ptr<Inventory> before;
+  if (options.format == "table") {
+    xml::Document empty;
+    before = std::make_unique<Inventory>(documents.userData ? *documents.userData : empty);
+  }
+  if (!documents.userData) {
+    // Kept here rather than left to the run, so that the merged inventory can be read and saved.
+    documents.userData = std::make_shared<xml::Document>();
+    documents.userData->SetDocumentElement(documents.userData->CreateElement(vocab::results_root));
+  }
+
+  LiveProgress progress;
+  ReportPrinter printer([&progress] { progress.Clear(); });
+  Locate locate(FileSystemWithShares(options.stage.shares),
+                FileSystemWithShares(options.stage.shares));
+  locate.Asynchronous(!options.sync);
+  locate.LogFile(options.log);
+  Outcome outcome = options.sync ? RunSynchronously(locate, documents, filter)
+                                 : RunAsynchronously(locate, documents, filter, progress);
+  progress.Clear();
+
+  if (outcome.cancelled) {
+    std::string wrote = "nothing was written";
+    if (!outcome.results.empty() && (!options.stage.output.empty() || options.format == "xml")) {
+      WriteTextOutput(outcome.results, options.stage.output);
+      wrote = fmt::format(
+          "what the {} stage had was written to {}", StageName(outcome.stage),
+          options.stage.output.empty() ? "standard output" : "'" + options.stage.output + "'");
+    }
+    fmt::print(stderr, "trllocator: cancelled during the {} stage; {}{}\n",
+               StageName(outcome.stage), wrote,
+               options.save ? "; the user data was not saved" : "");
+    return kExitInterrupted;
+  }
+  if (!outcome.complete || outcome.results.empty()) {
+    throw CommandError("the locate run did not complete; the user data was not saved", kExitFailed);
+  }
+
+  if (options.save) ReplaceFileAtomically(options.userData, documents.userData->Xml(), true);
+  if (options.format == "table") {
+    xml::Document none;
+    xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
+    WriteTextOutput(
+        WithoutLastLineEnd(FindingsTable(before->Changes(*documents.userData, fingerprint))),
+        options.stage.output);
+  } else {
+    WriteTextOutput(outcome.results, options.stage.output);
+  }
+  return kExitOk;
+}
+
+}  // namespace
+
+std::function<int()> AddLocateCommand(CLI::App& app) {
+  auto options = std::make_shared<LocateOptions>();
+  CLI::App* command = app.add_subcommand(
+      "locate",
+      "Find the known applications in the searched folders, identify their versions and merge "
+      "the findings into the user data");
+  command->add_option("--search-options", options->searchOptions,
+                      "Search options document (computers, drives, folders to search)");
+  command->add_option("--application-options", options->applicationOptions,
+                      "Application options document (which applications take part)");
+  command->add_option("--fingerprint", options->fingerprint, "Fingerprint database");
+  command->add_option("--user-data", options->userData,
+                      "User data of earlier runs, merged with this run's findings (default: a new, "
+                      "empty inventory)");
+  command
+      ->add_option("--filter", options->filter,
+                   "Filter rules: a number 0-63, or a comma list of low-weights, missing-files, "
+                   "low-file-count, duplicate-matches, flag-unknowns, flag-unmanaged, or all")
+      ->capture_default_str();
+  command->add_option("--log", options->log, "Append the run log to FILE");
+  AddShareOption(*command, options->stage);
+  AddOutputOption(*command, options->stage);
+  command->add_flag("--save", options->save,
+                    "After a complete run, replace the --user-data file with the merged user data "
+                    "(atomically; the previous one is kept as FILE.bak)");
+  command->add_option("--format", options->format, "xml: the merged results; table: a summary")
+      ->check(CLI::IsMember({"xml", "table"}))
+      ->capture_default_str();
+  command->add_flag("--sync", options->sync,
+                    "Run each stage straight through (no live progress; Ctrl-C ends the process)");
+  command->footer(
+      "Without any document option, runs on the bundled example. Exit codes: 0 done; 1 the run "
+      "did not complete or its output could not be written; 2 a bad command line or input "
+      "document; 130 cancelled by Ctrl-C (a second Ctrl-C quits at once).");
+  return [command, options] { return command->parsed() ? RunLocate(*options) : -1; };
+}
+
+}  // namespace trl::cli
