@@ -5,6 +5,7 @@
 
 #include "command_error.h"
 #include "compare_command.h"
+#include "fingerprint_command.h"
 #include "search_command.h"
 #include "version.h"
 
@@ -15,7 +16,8 @@ int main(int argc, char** argv) {
   app.footer(
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
       "2 a bad command line or input document.");
-  std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app)};
+  std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app),
+                                             AddFingerprintCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {
