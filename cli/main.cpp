@@ -6,6 +6,7 @@
 #include "command_error.h"
 #include "compare_command.h"
 #include "filter_command.h"
+#include "fingerprint_command.h"
 #include "locate_command.h"
 #include "merge_command.h"
 #include "search_command.h"
@@ -20,7 +21,7 @@ int main(int argc, char** argv) {
       "2 a bad command line or input document.");
   std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app),
                                              AddFilterCommand(app), AddMergeCommand(app),
-                                             AddLocateCommand(app)};
+                                             AddLocateCommand(app), AddFingerprintCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {

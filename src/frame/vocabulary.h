@@ -21,6 +21,8 @@ inline constexpr std::string_view v_history = "v_history";
 inline constexpr std::string_view a_missing_list =
     "a_missing";  // the list under the user-data root
 inline constexpr std::string_view results_root = "trl_applicationdata";
+inline constexpr std::string_view fingerprint_root =
+    "trl_fingerprint";  // root of a database the command line creates
 inline constexpr std::string_view events = "events";
 inline constexpr std::string_view event = "event";
 
