@@ -51,26 +51,28 @@ void Merge::MergeApplication(xml::Node application, xml::Node oldFolder, const D
   if (newId == -1 && oldId != -1) on([&] { application.SetAttribute(vocab::a_update_q, "1"); });
 
   // The history travels with the application; a change of the identified version adds the
-  // version it had, stamped with the time of the change.
+  // version it had, stamped with the time of the change. Both are taken from the old entry
+  // before it is discarded, and join the new one where it then stands.
   xml::Node history;
   on([&] { history = FirstChildElement(old, vocab::v_history); });
   xml::Node carried;
-  if (history) on([&] { carried = application.AppendChild(history.CloneNode(true)); });
+  if (history) on([&] { carried = history.CloneNode(true); });
+  xml::Node entry;
   if (newId != oldId && oldId != 0) {
     on([&] {
-      if (!carried) {
-        carried =
-            application.AppendChild(application.OwnerDocument().CreateElement(vocab::v_history));
-      }
+      if (!carried) carried = objOldResultsDOM->CreateElement(vocab::v_history);
     });
     xml::Node version;
     on([&] { version = FirstChildElement(old, vocab::v); });
     on([&] { version.SetAttribute(vocab::v_updated, FormatDateTime(Now())); });
     on([&] { version.SetAttribute(vocab::v_update_q, "1"); });
-    on([&] { carried.AppendChild(version.CloneNode(false)); });
+    on([&] { entry = version.CloneNode(false); });
   }
 
-  on([&] { oldFolder.ReplaceChild(application, old); });
+  xml::Node merged = application;
+  on([&] { merged = oldFolder.ReplaceChild(application, old); });
+  if (entry) on([&] { carried.AppendChild(entry); });
+  if (carried) on([&] { merged.AppendChild(carried); });
 }
 
 }  // namespace trl

@@ -87,19 +87,22 @@ bool Merge::MissingApplication(xml::Node& application) {
     xml::Node computer = drive.ParentNode();
     xml::Node root = objOldResultsDOM->DocumentElement();
     merge::PlaceIndex& places = Use(oldPlaces_);
-    places.Forget(application);
     bool folderEmpties = folder.CountChildElements(vocab::a, 2) == 1;
     bool driveEmpties = folderEmpties && drive.CountChildElements(vocab::d, 2) == 1;
     bool computerGoes =
         driveEmpties && computer.CountChildElements(vocab::m, 2) == 1 && places.Computers() == 1;
     if (computerGoes) {
+      places.Removing(computer);
       root.RemoveChild(computer);
       places.ComputerRemoved();
     } else if (driveEmpties) {
+      places.Removing(drive);
       computer.RemoveChild(drive);
     } else if (folderEmpties) {
+      places.Removing(folder);
       drive.RemoveChild(folder);
     } else {
+      places.Removing(application);
       folder.RemoveChild(application);
     }
   });

@@ -8,16 +8,6 @@
 namespace trl::merge {
 namespace {
 
-std::string Key(std::string_view computer, std::string_view drive, std::string_view folder,
-                std::string_view id) {
-  // XML text never holds a NUL, so it separates the parts unambiguously.
-  std::string key;
-  key.reserve(computer.size() + drive.size() + folder.size() + id.size() + 3);
-  key.append(computer).append(1, '\0').append(drive).append(1, '\0');
-  key.append(folder).append(1, '\0').append(id);
-  return key;
-}
-
 // The parent of `node` when it is a `tag` element.
 xml::Node ParentNamed(const xml::Node& node, std::string_view tag) {
   xml::Node parent = node.ParentNode();
@@ -30,45 +20,51 @@ xml::Node ParentNamed(const xml::Node& node, std::string_view tag) {
 
 PlaceIndex::PlaceIndex(xml::Document& document) : document_(document) {
   if (!document.DocumentElement()) return;
-  for (const xml::Node& a : document.AsNode().GetElementsByTagName(vocab::a)) {
-    if (auto key = KeyOf(a)) byPlace_[*key].push_back(a);
+  for (const xml::Node& d : document.AsNode().GetElementsByTagName(vocab::d)) {
+    if (auto key = KeyOf(d)) folders_[*key].push_back(d);
   }
 }
 
-std::optional<std::string> PlaceIndex::KeyOf(const xml::Node& application) {
-  xml::Node d = ParentNamed(application, vocab::d);
-  xml::Node m = d ? ParentNamed(d, vocab::m) : xml::Node();
+std::optional<std::string> PlaceIndex::KeyOf(const xml::Node& folder) {
+  xml::Node m = ParentNamed(folder, vocab::m);
   xml::Node c = m ? ParentNamed(m, vocab::c) : xml::Node();
   if (!c) return std::nullopt;
   auto computer = c.GetAttribute(vocab::c_name);
   auto drive = m.GetAttribute(vocab::m_name);
-  auto folder = d.GetAttribute(vocab::d_name);
-  auto id = application.GetAttribute(vocab::a_id);
-  if (!computer || !drive || !folder || !id) return std::nullopt;
-  return Key(*computer, *drive, *folder, *id);
+  auto name = folder.GetAttribute(vocab::d_name);
+  if (!computer || !drive || !name) return std::nullopt;
+  // XML text never holds a NUL, so it separates the parts unambiguously.
+  return *computer + '\0' + *drive + '\0' + *name;
 }
 
 xml::Node PlaceIndex::Find(const std::string& computer, const std::string& drive,
                            const std::string& folder, const std::string& id) {
+  auto select = [&] {
+    return document_.DocumentElement().SelectSingleNode(
+        "//c[@c_name='" + computer + "']/m[@m_name='" + drive + "']/d[@d_name='" + folder +
+        "']/a[@a_id='" + id + "']");
+  };
   for (const std::string* part : {&computer, &drive, &folder, &id}) {
-    if (part->find('\'') != std::string::npos) {
-      return document_.DocumentElement().SelectSingleNode(
-          "//c[@c_name='" + computer + "']/m[@m_name='" + drive + "']/d[@d_name='" + folder +
-          "']/a[@a_id='" + id + "']");
-    }
+    if (part->find('\'') != std::string::npos) return select();
   }
   if (!document_.DocumentElement()) Fail(kObjectNotSet);
-  auto found = byPlace_.find(Key(computer, drive, folder, id));
-  return found == byPlace_.end() || found->second.empty() ? xml::Node() : found->second.front();
+  auto found = folders_.find(computer + '\0' + drive + '\0' + folder);
+  if (found == folders_.end() || found->second.empty()) return xml::Node();
+  if (found->second.size() > 1) return select();
+  return document_.FindChild(found->second.front(), vocab::a, vocab::a_id, id);
 }
 
-void PlaceIndex::Forget(const xml::Node& application) {
-  auto key = KeyOf(application);
-  if (!key) return;
-  auto found = byPlace_.find(*key);
-  if (found == byPlace_.end()) return;
-  std::vector<xml::Node>& nodes = found->second;
-  nodes.erase(std::remove(nodes.begin(), nodes.end(), application), nodes.end());
+void PlaceIndex::Removing(const xml::Node& node) {
+  std::vector<xml::Node> folders = node.GetElementsByTagName(vocab::d);
+  if (node.NodeName() == vocab::d) folders.push_back(node);
+  for (const xml::Node& d : folders) {
+    auto key = KeyOf(d);
+    if (!key) continue;
+    auto found = folders_.find(*key);
+    if (found == folders_.end()) continue;
+    std::vector<xml::Node>& list = found->second;
+    list.erase(std::remove(list.begin(), list.end(), d), list.end());
+  }
 }
 
 size_t PlaceIndex::Computers() {
