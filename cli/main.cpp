@@ -18,7 +18,7 @@ int main(int argc, char** argv) {
   app.set_version_flag("--version", std::string("trllocator ") + TRL_VERSION);
   app.footer(
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
-      "2 a bad command line or input document.");
+      "2 a bad command line or input document; 130 cancelled by Ctrl-C.");
   std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app),
                                              AddFilterCommand(app), AddMergeCommand(app),
                                              AddLocateCommand(app), AddFingerprintCommand(app)};
