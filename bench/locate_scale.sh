@@ -36,11 +36,11 @@ if [[ ! -f $data.done ]]; then
 fi
 
 entry() {
-  printf '<d d_text="%s" d_search="1" d_search_recurse="1"><d_search_mask/></d>' "${1//\//\\}"
+  printf '<d d_id="%s" d_text="%s" d_search="1" d_search_recurse="1"><d_search_mask/></d>' "$1" "${2//\//\\}"
 }
 options="$work_dir/search-options.xml"
 cat >"$options" <<EOF
-<trl_searchoptions><c c_id="1" c_text="localhost" c_name="localhost" c_local="1"><m m_id="1" m_text="" m_name="" m_type="3">$(entry "$tree")$(entry "$data/disk")</m></c></trl_searchoptions>
+<trl_searchoptions><c c_id="1" c_text="localhost" c_name="localhost" c_local="1"><m m_id="1" m_text="" m_name="" m_type="3">$(entry 1 "$tree")$(entry 2 "$data/disk")</m></c></trl_searchoptions>
 EOF
 echo "<trl_applicationoptions/>" >"$work_dir/application-options.xml"
 echo "<trl_applicationdata/>" >"$work_dir/user-data.xml"

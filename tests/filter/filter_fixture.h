@@ -13,8 +13,8 @@
 namespace trl::testing {
 
 // A version as a compare writes it, from "v_id v_act v_max f_act f_max"; v_name is "V" + v_id.
-inline std::string Version(std::string_view spec, std::string_view children = "") {
-  auto w = Words(spec);
+inline std::string Version(std::string_view text, std::string_view children = "") {
+  auto w = Words(text);
   std::string attributes = "v_id=\"" + w[0] + "\" v_name=\"V" + w[0] + "\" v_seq=\"" + w[0] +
                            "\" v_max=\"" + w[2] + "\" v_act=\"" + w[1] + "\" f_max=\"" + w[4] +
                            "\" f_act=\"" + w[3] + "\"";

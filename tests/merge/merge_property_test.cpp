@@ -30,7 +30,7 @@ struct App {
 
 class Generator {
  public:
-  explicit Generator(uint32_t seed) : rng_(seed) {}
+  explicit Generator(uint32_t trial) : rng_(trial) {}
 
   int Below(int n) { return static_cast<int>(rng_() % static_cast<uint32_t>(n)); }
   bool Chance(int percent) { return Below(100) < percent; }
@@ -118,8 +118,8 @@ struct Run {
   int computers = 1;
 };
 
-Run Generate(uint32_t seed) {
-  Generator g(seed);
+Run Generate(uint32_t trial) {
+  Generator g(trial);
   Run run;
   run.computers = 1 + g.Below(2);
   run.rootUpdate = g.Flag(50);
@@ -222,10 +222,10 @@ struct Seen {
   int kept = 0, replaced = 0, changed = 0, missing = 0, pruned = 0;
 };
 
-void CheckRun(uint32_t seed, Seen& seen) {
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  Run run = Generate(seed);
-  Generator g(seed ^ 0x5bd1e995u);
+void CheckRun(uint32_t trial, Seen& seen) {
+  SCOPED_TRACE("trial " + std::to_string(trial));
+  Run run = Generate(trial);
+  Generator g(trial ^ 0x5bd1e995u);
   std::string root = Attr("a_update_q", run.rootUpdate) + Attr("a_dupes_q", run.rootDupes);
   auto old = Parse(ResultsXml(run.old, true, root));
   auto fresh = Parse(ResultsXml(run.fresh, false, ""));
@@ -304,8 +304,8 @@ void CheckRun(uint32_t seed, Seen& seen) {
 
 TEST(MergePropertyTest, EveryApplicationIsKeptReplacedOrMissing) {
   Seen seen;
-  for (uint32_t seed = 1; seed <= 1500; ++seed) {
-    CheckRun(seed, seen);
+  for (uint32_t trial = 1; trial <= 1500; ++trial) {
+    CheckRun(trial, seen);
     if (HasFatalFailure() || HasNonfatalFailure()) break;
   }
   for (int count : {seen.kept, seen.replaced, seen.changed, seen.missing, seen.pruned}) {
