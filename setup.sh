@@ -1,9 +1,16 @@
 #!/usr/bin/env bash
 # Installs the Debian packages trlLocator needs (only those missing), then configures and builds.
-# Usage: ./setup.sh [build-dir]     (default: build)
+# Usage: ./setup.sh [example] [build-dir]     (default build dir: build)
+#   example  also installs the Node.js packages Debian ships on their own that the bundled example
+#            looks for (semver, graceful-fs, which, nopt), so that the example finds real software
 set -euo pipefail
 
 here="$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)"
+example=0
+if [ "${1:-}" = example ]; then
+  example=1
+  shift
+fi
 build_dir="${1:-$here/build}"
 
 packages=(
@@ -11,6 +18,9 @@ packages=(
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev
   libgtest-dev libgmock-dev libbenchmark-dev
 )
+if ((example)); then
+  packages+=(node-semver node-graceful-fs node-which node-nopt)
+fi
 
 missing=()
 for p in "${packages[@]}"; do

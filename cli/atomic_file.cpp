@@ -51,8 +51,15 @@ void ReplaceFileAtomically(const std::string& path, const std::string& text, boo
   int fd = ::mkstemp(temporary.data());
   if (fd < 0) Fail("create a file beside", path, errno);
 
+  // The replacement keeps the permissions of the file it replaces; a new file gets the usual ones.
   struct stat existing {};
-  if (::stat(path.c_str(), &existing) == 0) ::fchmod(fd, existing.st_mode & 07777);
+  if (::stat(path.c_str(), &existing) == 0) {
+    ::fchmod(fd, existing.st_mode & 07777);
+  } else {
+    mode_t mask = ::umask(0);
+    ::umask(mask);
+    ::fchmod(fd, 0666 & ~mask);
+  }
   bool written = WriteAll(fd, text) && WriteAll(fd, "\n") && ::fsync(fd) == 0;
   int error = errno;
   if (::close(fd) != 0 && written) {

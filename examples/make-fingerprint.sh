@@ -1,7 +1,8 @@
 #!/bin/sh
 # Rebuilds examples/fingerprint.xml: a sample fingerprint database of a few packages that npm
-# bundles, several published releases of each, among them the ones the npm of Node.js 20 on
-# Debian carries. Each release's tarball comes from the npm registry (npm pack), is unpacked into a
+# bundles, several published releases of each, among them the ones the npm of Node.js 20 bundles
+# and the ones Debian 12 packages on their own (node-semver, node-graceful-fs, node-which,
+# node-nopt). Each release's tarball comes from the npm registry (npm pack), is unpacked into a
 # temporary folder and described with `trllocator fingerprint add`.
 #
 # Ids are fixed so that a rebuild gives the same database: an application's a_id is its number in
@@ -19,10 +20,10 @@ output=${1:-$here/fingerprint.xml}
 
 # a_id, package, releases
 packages='
-1 semver 7.6.3 7.7.2 7.8.5 7.8.6
+1 semver 7.3.5 7.6.3 7.7.2 7.8.5 7.8.6
 2 graceful-fs 4.2.9 4.2.10 4.2.11 4.2.12
-3 which 4.0.0 5.0.0 6.0.0 6.0.1
-4 nopt 7.2.1 8.1.0 9.0.0 10.0.1
+3 which 2.0.2 4.0.0 5.0.0 6.0.0 6.0.1
+4 nopt 5.0.0 7.2.1 8.1.0 9.0.0 10.0.1
 5 cacache 18.0.4 19.0.1 20.0.4 21.0.2
 '
 
