@@ -4,6 +4,8 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "frame/vocabulary.h"
 #include "trl/xml.h"
 
@@ -60,7 +62,10 @@ void LiveProgress::Update(const std::string& updateXml) {
   if (auto folders = e.GetAttribute(vocab::e_d_count)) folders_ = *folders;
   if (auto files = e.GetAttribute(vocab::e_f_count)) files_ = *files;
   if (auto matched = e.GetAttribute(vocab::e_match_count)) matched_ = *matched;
-  if (auto path = e.GetAttribute(vocab::e_d_name)) path_ = *path;
+  if (auto path = e.GetAttribute(vocab::e_d_name)) {
+    path_ = *path;
+    std::replace(path_.begin(), path_.end(), '\\', '/');  // paths read as this system writes them
+  }
   Draw(false);
 }
 
