@@ -28,7 +28,8 @@ void Locate::StatusUpdate(Stage& stage, const std::string& strUpdateXML,
   OnError on{kClass, stage.names.statusLabel};
   xml::Document& results = *stage.results->get();
   on([&] { progressDocument_->LoadXml(strUpdateXML); });
-  on([&] { results.LoadXml(strResultsXML); });
+  bool loaded = false;
+  on([&] { loaded = results.LoadXml(strResultsXML); });
 
   // A report that cannot be read at all reads as status 0; one whose e_status is missing or not a
   // number leaves the status as it was.
@@ -43,7 +44,9 @@ void Locate::StatusUpdate(Stage& stage, const std::string& strUpdateXML,
     status_ = ToInt16(*statusText);
   });
 
-  on([&] { RaiseStatusUpdate(progressDocument_->Xml(), results.Xml()); });
+  // A stage's text is this layer's own serialisation, which a load and a new serialisation give
+  // back unchanged; only a text that did not load reads differently (as nothing).
+  on([&] { RaiseStatusUpdate(progressDocument_->Xml(), loaded ? strResultsXML : results.Xml()); });
   if (status_ == kStatusComplete) End(stage);
 }
 

@@ -107,6 +107,8 @@ class LocateTest : public ::testing::Test {
     locate.OnStatusUpdate([&](const std::string& update, const std::string& results) {
       Report report = ReadReport(update);
       reports.push_back(report);
+      // The relay passes a stage's text on as a load and a new serialisation would give it.
+      if (!results.empty()) EXPECT_EQ(Parse(results)->Xml(), results);
       if (report.mode == Locate::kFinished) lastResults_ = results;
       if (onReport) onReport(report);
       ended = report.status == kStatusCancelled || report.mode == Locate::kFinished;
