@@ -106,10 +106,12 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
     }
     cancelIfAsked();
   });
-  locate.OnProgressUpdate([&](const std::string& update) {
-    progress.Update(update);
-    cancelIfAsked();
-  });
+  if (progress.Active()) {
+    locate.OnProgressUpdate([&](const std::string& update) {
+      progress.Update(update);
+      cancelIfAsked();
+    });
+  }
   Timer watch([&] {
     progress.Tick();
     cancelIfAsked();

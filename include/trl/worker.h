@@ -44,6 +44,7 @@ class Worker {
   // Events, raised only while Asynchronous is true.
   void OnStatusUpdate(StatusUpdateHandler handler) { statusUpdate_ = std::move(handler); }
   void OnProgressUpdate(ProgressUpdateHandler handler) { progressUpdate_ = std::move(handler); }
+  bool ProgressObserved() const { return static_cast<bool>(progressUpdate_); }
 
  protected:
   Worker(std::string_view className, int32_t mode);

@@ -133,7 +133,8 @@ void Worker::RaiseProgressUpdate(const std::string& update) {
 }
 
 void Worker::RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill) {
-  if (!asynchronous_) return;
+  // Nobody listening: the report is not even built (a walk reports every folder).
+  if (!asynchronous_ || !progressUpdate_) return;
   fill(NewProgressElement());
   RaiseProgressUpdate(progress_->Xml());
 }

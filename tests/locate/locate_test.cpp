@@ -3,9 +3,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -142,7 +144,13 @@ TEST_F(LocateTest, SynchronousAndAsynchronousRunsMergeTheSameInventory) {
 
 TEST_F(LocateTest, StageReportsAreRelayedInOrderAndEachStagesEventsGathered) {
   auto locate = NewLocate(true);
+  std::vector<int> progressModes;
+  locate->OnProgressUpdate(
+      [&](const std::string& update) { progressModes.push_back(ReadReport(update).mode); });
   std::vector<Report> reports = RunAsync(*locate, SearchOptions(), nullptr);
+  // Each stage's progress reports reach the client as the stage made them, stage after stage.
+  EXPECT_TRUE(std::is_sorted(progressModes.begin(), progressModes.end()));
+  EXPECT_THAT(std::set<int>(progressModes.begin(), progressModes.end()), ElementsAre(1, 2, 3, 4));
   // A finished stage's last report comes before the next stage's first one.
   EXPECT_THAT(reports, ElementsAreArray(std::vector<Report>{{0, 1},
                                                             {1, 1},
