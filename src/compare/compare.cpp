@@ -11,6 +11,7 @@
 #include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
+#include "frame/every_element.h"
 #include "frame/fixes.h"
 #include "frame/general.h"
 #include "frame/use_object.h"
@@ -28,12 +29,6 @@ using compare::kClass;
 namespace {
 
 constexpr int32_t kCompareMode = 2;
-
-// Every `tag` element of the document, as a selection of "//tag" from its root gives them.
-std::vector<xml::Node> EveryElement(xml::Document& document, std::string_view tag) {
-  if (!document.DocumentElement()) Fail(kObjectNotSet);
-  return document.AsNode().GetElementsByTagName(tag);
-}
 
 }  // namespace
 

@@ -7,6 +7,7 @@
 #include "filter/filter_versions.h"
 #include "filter/version_values.h"
 #include "frame/error_handler.h"
+#include "frame/every_element.h"
 #include "frame/general.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
@@ -20,12 +21,6 @@ using filter::kFilterLabel;
 namespace {
 
 constexpr int32_t kFilterMode = 3;
-
-// Every `tag` element of the document, as a selection of "//tag" from its root gives them.
-std::vector<xml::Node> EveryElement(xml::Document& document, std::string_view tag) {
-  if (!document.DocumentElement()) Fail(kObjectNotSet);
-  return document.AsNode().GetElementsByTagName(tag);
-}
 
 // The `tag` children of `parent`, or none when they cannot be read.
 std::vector<xml::Node> ChildrenOf(const OnError& on, const xml::Node& parent,

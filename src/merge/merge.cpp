@@ -5,6 +5,7 @@
 
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
+#include "frame/every_element.h"
 #include "frame/fixes.h"
 #include "frame/general.h"
 #include "frame/use_object.h"
@@ -26,12 +27,6 @@ xml::DocumentPtr EmptyResults() {
   auto document = std::make_shared<xml::Document>();
   document->SetDocumentElement(document->CreateElement(vocab::results_root));
   return document;
-}
-
-// Every `tag` element of the document, as a selection of "//tag" from its root gives them.
-std::vector<xml::Node> EveryElement(xml::Document& document, std::string_view tag) {
-  if (!document.DocumentElement()) Fail(kObjectNotSet);
-  return document.AsNode().GetElementsByTagName(tag);
 }
 
 }  // namespace
