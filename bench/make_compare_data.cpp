@@ -3,6 +3,10 @@
 // Writes the inputs for timing the compare stage; the same arguments always give the same bytes.
 //   OUT_DIR/fingerprint.xml  APPS applications, each with 5 versions of the same 20 files; every
 //                            file carries its size (p_type 2) and lower-case hex MD5 (p_type 3).
+//                            Sizes run from 1 KiB to 4 MiB, spread evenly over the powers of two
+//                            between (mean about 520 KiB, median about 64 KiB), as installed
+//                            programs and libraries measure. A version that is installed nowhere
+//                            has no content, so its digests are drawn at random.
 //   OUT_DIR/disk/            one version of every 20th application (N % 20 == 0) installed under
 //                            "Program Files", its files holding exactly that version's content.
 //   OUT_DIR/local-files.xml  exactly LOCAL_FILES files (default APPS * 100) as the search stage
@@ -290,6 +294,12 @@ struct App {
   std::array<AppFile, kFilesPerVersion> files;
 };
 
+// From 1 KiB up to 4 MiB: a power of two between, then evenly within it.
+uint32_t FileSize(Rng& rng) {
+  const uint32_t low = uint32_t{1} << (10 + rng.Below(12));
+  return static_cast<uint32_t>(low + rng.Below(low));
+}
+
 bool Installed(size_t number) { return number % kInstallEvery == 0; }
 int InstalledVersion(size_t number) {
   return static_cast<int>(number / kInstallEvery % kVersions) + 1;
@@ -355,7 +365,7 @@ std::vector<App> PlanApps(size_t count) {
       for (size_t v = 0; v < kVersions; ++v) {
         uint32_t size;
         do {
-          size = static_cast<uint32_t>(1024 + rng.Below(16 * 1024 - 1024 + 1));
+          size = FileSize(rng);
         } while (std::find(file.sizes.begin(), file.sizes.begin() + static_cast<ptrdiff_t>(v),
                            size) != file.sizes.begin() + static_cast<ptrdiff_t>(v));
         file.sizes[v] = size;
@@ -375,6 +385,18 @@ void Content(size_t number, int version, size_t f, uint32_t size, std::vector<ui
     const size_t count = std::min<size_t>(8, size - at);
     for (size_t i = 0; i < count; ++i) out[at + i] = static_cast<uint8_t>(word >> 8 * i);
   }
+}
+
+// The digest of a file no disk holds: 32 lower-case hex digits, like an MD5.
+std::string RandomDigest(size_t number, int version, size_t f) {
+  Rng rng(StartFor(number, static_cast<uint64_t>(version), f + 1));
+  static constexpr char kHex[] = "0123456789abcdef";
+  std::string hex;
+  for (int word = 0; word < 2; ++word) {
+    const uint64_t bits = rng.Next();
+    for (int i = 0; i < 16; ++i) hex += kHex[bits >> (4 * i) & 0xF];
+  }
+  return hex;
 }
 
 [[noreturn]] void Fail(const std::string& what, const std::string& why = std::strerror(errno)) {
@@ -493,10 +515,14 @@ uint64_t WriteFingerprint(const fs::path& out, const fs::path& disk, const std::
       for (size_t f = 0; f < app.files.size(); ++f) {
         const AppFile& file = app.files[f];
         const uint32_t size = file.sizes[v - 1];
-        Content(number, v, f, size, content);
+        std::string digest;
         if (install) {
+          Content(number, v, f, size, content);
           WriteFile(DiskFolder(disk, app, file.relpath) / file.name, content);
           diskBytes += size;
+          digest = Md5Hex(content);
+        } else {
+          digest = RandomDigest(number, v, f);
         }
         xml << "      <f";
         xml.Attr("f_id", f + 1)
@@ -505,7 +531,7 @@ uint64_t WriteFingerprint(const fs::path& out, const fs::path& disk, const std::
             .Attr("f_weight", file.weightless ? "0" : "1");
         xml << ">\n        <p p_type=\"2\" p_weight=\"1\"";
         xml.Attr("p_value", size) << "/>\n        <p p_type=\"3\" p_weight=\"2\"";
-        xml.Attr("p_value", Md5Hex(content)) << "/>\n      </f>\n";
+        xml.Attr("p_value", digest) << "/>\n      </f>\n";
         xml.MaybeFlush();
       }
       xml << "    </v>\n";

@@ -117,13 +117,13 @@ void Compare::UpdateDraftDetails(VersionDraft& draft, const VersionFiles& files,
   OnError on{kClass, compare::kUpdateFileDetailsLabel};
   const FingerprintFile::Details& details = f.FindDetails();
   for (const auto& failure : details.readFailures) FingerprintFile::Replay(on, failure);
-  auto at = files.byId.find(std::to_string(details.id));
-  if (at == files.byId.end()) {
+  std::optional<size_t> at = files.IndexOf(details.id);
+  if (!at) {
     // No copy of the file holds that id: reported as the read of the missing copy is.
     on([&] { TextOf(xml::Node(), vocab::f_exists); });
     return;
   }
-  size_t i = at->second;
+  size_t i = *at;
   if (draft.found[i]) return;
   draft.found[i] = true;
   draft.maxMask[i] = details.maxMask;

@@ -115,7 +115,7 @@ void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
   uint32_t hash = Hash(key);
   Slot& slot = slots_[Probe(key, hash)];
   if (slot.first == kNone) {
-    slot = {hash, record, record};
+    slot = {hash, record, record, encodedAt};
     ++keys_;
   } else {
     records_[slot.last].next = record;
@@ -143,7 +143,7 @@ size_t LocalFileIndex::Probe(std::string_view key, uint32_t hash) const {
   for (size_t at = hash & mask;; at = (at + 1) & mask) {
     const Slot& slot = slots_[at];
     if (slot.first == kNone) return at;
-    if (slot.hash == hash && NameAt(records_[slot.first].encodedFilename) == key) return at;
+    if (slot.hash == hash && TerminatedEquals(names_.data() + slot.key, key)) return at;
   }
 }
 

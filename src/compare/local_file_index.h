@@ -109,11 +109,13 @@ class LocalFileIndex {
     uint32_t encodedFilename;
     uint32_t filename;
   };
-  // One key of the open-addressing table: the first and last records under it. 12 bytes.
+  // One key of the open-addressing table: the first and last records under it, and where its
+  // text is, so a lookup touches no record. 16 bytes.
   struct Slot {
     uint32_t hash;
     uint32_t first = kNone;
     uint32_t last = kNone;
+    uint32_t key;
   };
 
   static uint32_t Hash(std::string_view key);

@@ -1,6 +1,8 @@
 #include "compare/version_draft.h"
 
+#include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <cmath>
 #include <string_view>
 
@@ -37,6 +39,17 @@ double XPathNumber(std::string_view text) {
   return negative ? -value : value;
 }
 
+// The number `text` writes in the form std::to_string gives it, or none when it is written any
+// other way ("007", "+7", " 7", "-0") or is not a 32-bit number.
+std::optional<int32_t> PlainNumber(std::string_view text) {
+  std::string_view digits = text.starts_with('-') ? text.substr(1) : text;
+  if (digits.empty() || (digits.front() == '0' && text.size() > 1)) return std::nullopt;
+  int32_t value = 0;
+  auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+  if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
+  return value;
+}
+
 }  // namespace
 
 bool CarriesWeight(const xml::Node& f) {
@@ -46,9 +59,18 @@ bool CarriesWeight(const xml::Node& f) {
 
 VersionFiles::VersionFiles(const std::vector<xml::Node>& files)
     : files_(files), weighted_(files.size(), -1) {
+  byId_.reserve(files.size());
   for (size_t i = 0; i < files.size(); ++i) {
-    if (auto id = files[i].GetAttribute(vocab::f_id)) byId.try_emplace(*id, i);
+    auto text = files[i].GetAttribute(vocab::f_id);
+    if (auto id = text ? PlainNumber(*text) : std::nullopt) byId_.emplace_back(*id, i);
   }
+  std::sort(byId_.begin(), byId_.end());
+}
+
+std::optional<size_t> VersionFiles::IndexOf(int32_t id) const {
+  auto at = std::lower_bound(byId_.begin(), byId_.end(), std::make_pair(id, size_t{0}));
+  if (at == byId_.end() || at->first != id) return std::nullopt;
+  return at->second;
 }
 
 bool VersionFiles::Weighted(size_t i) const {

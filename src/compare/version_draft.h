@@ -1,8 +1,8 @@
 #pragma once
 
 #include <cstdint>
-#include <string>
-#include <unordered_map>
+#include <optional>
+#include <utility>
 #include <vector>
 
 #include "trl/xml.h"
@@ -19,7 +19,8 @@ class VersionFiles {
   // `files` must outlive this object.
   explicit VersionFiles(const std::vector<xml::Node>& files);
 
-  std::unordered_map<std::string, size_t> byId;  // f_id -> the first file with it
+  // The first file whose f_id is written exactly as `id` is, as a find looks its copy up.
+  std::optional<size_t> IndexOf(int32_t id) const;
 
   // CarriesWeight of file `i`, read when first asked: a copy is mostly judged incomplete by the
   // first file it lacks.
@@ -27,6 +28,9 @@ class VersionFiles {
 
  private:
   const std::vector<xml::Node>& files_;
+  // (id, position) of the files whose f_id is a number in its plain form, sorted: no other form
+  // is ever looked up.
+  std::vector<std::pair<int32_t, size_t>> byId_;
   mutable std::vector<int8_t> weighted_;  // -1: not read yet
 };
 

@@ -11,6 +11,16 @@ std::string LowerCase(std::string_view text);
 
 bool IsValidUtf8(std::string_view text);
 
+// Whether the '\0'-terminated `text` equals `view`, without measuring `text` first: tags,
+// attribute names and index keys are compared by the million.
+inline bool TerminatedEquals(const char* text, std::string_view view) {
+  for (char c : view) {
+    if (*text != c || c == '\0') return false;
+    ++text;
+  }
+  return *text == '\0';
+}
+
 // True when every character of valid UTF-8 `text` may stand in an XML 1.0 document.
 bool IsXmlSafe(std::string_view text);
 

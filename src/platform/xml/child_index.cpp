@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <optional>
 
+#include "platform/text.h"
 #include "platform/xml/tree_walk.h"
 
 namespace trl::xml {
@@ -10,7 +11,8 @@ namespace {
 
 std::optional<std::string_view> KeyOf(pugi::xml_node child, std::string_view tag,
                                       const std::string& attr) {
-  if (child.type() != pugi::node_element || tag != child.name()) return std::nullopt;
+  if (child.type() != pugi::node_element || !TerminatedEquals(child.name(), tag))
+    return std::nullopt;
   pugi::xml_attribute key = child.attribute(attr.c_str());
   if (!key) return std::nullopt;
   return std::string_view(key.value());

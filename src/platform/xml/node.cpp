@@ -1,6 +1,7 @@
 #include <string>
 
 #include "platform/failure.h"
+#include "platform/text.h"
 #include "platform/xml/document_impl.h"
 #include "platform/xml/text_builder.h"
 #include "platform/xml/tree_walk.h"
@@ -89,8 +90,9 @@ Document& Node::OwnerDocument() const {
 
 std::optional<std::string> Node::GetAttribute(std::string_view name) const {
   // A walk of the attributes needs no terminated copy of the name.
-  for (pugi::xml_attribute attr : Require(*this).attributes()) {
-    if (name == attr.name()) return std::string(attr.value());
+  for (pugi::xml_attribute attr = Require(*this).first_attribute(); attr;
+       attr = attr.next_attribute()) {
+    if (TerminatedEquals(attr.name(), name)) return std::string(attr.value());
   }
   return std::nullopt;
 }
@@ -100,7 +102,7 @@ void Node::SetAttribute(std::string_view name, std::string_view value) {
   CheckText(value);
   Document::Impl& impl = *document_->impl_;
   pugi::xml_attribute attr = node.first_attribute();
-  while (attr && name != attr.name()) attr = attr.next_attribute();
+  while (attr && !TerminatedEquals(attr.name(), name)) attr = attr.next_attribute();
   // A detached element is in no index yet: it joins its parent's when it is placed.
   bool indexed = node.parent() != impl.holder;
   bool written = false;
@@ -164,7 +166,8 @@ std::vector<Node> Node::ChildElements(std::string_view tag) const {
   Document::Impl& impl = *document_->impl_;
   std::vector<Node> children;
   for (pugi::xml_node child : node.children()) {
-    if (child.type() == pugi::node_element && child != impl.holder && tag == child.name()) {
+    if (child.type() == pugi::node_element && child != impl.holder &&
+        TerminatedEquals(child.name(), tag)) {
       children.push_back(impl.Wrap(child));
     }
   }
@@ -177,7 +180,9 @@ size_t Node::CountChildElements(std::string_view tag, size_t limit) const {
   size_t count = 0;
   for (pugi::xml_node child : node.children()) {
     if (count == limit) break;
-    if (child.type() == pugi::node_element && child != holder && tag == child.name()) ++count;
+    if (child.type() == pugi::node_element && child != holder &&
+        TerminatedEquals(child.name(), tag))
+      ++count;
   }
   return count;
 }

@@ -1,6 +1,7 @@
 #include <fmt/format.h>
 
 #include "platform/failure.h"
+#include "platform/text.h"
 #include "platform/xml/document_impl.h"
 #include "platform/xml/tree_walk.h"
 
@@ -60,7 +61,7 @@ std::vector<Node> Node::GetElementsByTagName(std::string_view tag) const {
   // The holder is the document's last child, so meeting it ends the tree.
   for (pugi::xml_node at = NextInSubtree(node, node); at && at != impl.holder;
        at = NextInSubtree(at, node)) {
-    if (at.type() == pugi::node_element && (tag == "*" || tag == at.name())) {
+    if (at.type() == pugi::node_element && (tag == "*" || TerminatedEquals(at.name(), tag))) {
       found.push_back(impl.Wrap(at));
     }
   }
