@@ -3,7 +3,6 @@
 #include <cstdint>
 #include <memory>
 #include <string>
-#include <tuple>
 #include <unordered_map>
 #include <unordered_set>
 #include <vector>
@@ -117,9 +116,15 @@ class Compare : public Worker {
   int32_t lngFolderCounter = 0;
   std::string startTime_;  // formatted
   xml::Node draftsFor_;    // the application whose version copies are drafted, if any
-  // The places the application being matched was found in: its computer, drive, folder and copy.
-  std::unordered_map<std::string, std::tuple<xml::Node, xml::Node, xml::Node, xml::Node>>
-      placesFound_;
+  // A place the application being matched was found in: the listed drive and the fingerprint
+  // application, with the computer, drive, folder and copy the results hold for them.
+  struct FoundPlace {
+    uint32_t drive;
+    const void* application;
+    xml::Node c, m, d, a;
+  };
+  // By application folder; a folder is mostly found on one drive only.
+  std::unordered_map<std::string, std::vector<FoundPlace>> placesFound_;
 
   // Every results copy of an application by a_id, so that pruning one application never scans
   // the whole results.

@@ -1,7 +1,7 @@
 #include "trl/compare.h"
 
+#include <algorithm>
 #include <optional>
-#include <tuple>
 #include <unordered_set>
 
 #include "compare/compare_names.h"
@@ -233,13 +233,20 @@ void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
   OnError on{kClass, compare::kMatchVersionLabel};
   // While one application is matched the results only grow, so a place found once is found again
   // by the same find-or-add steps, which add nothing and report nothing then.
-  std::string place = record.EncodedMachine() + '\0' + record.EncodedDrive() + '\0' + appFolder +
-                      '\0' + std::to_string(reinterpret_cast<uintptr_t>(match.v.ParentNode().Id()));
-  if (auto known = placesFound_.find(place); known != placesFound_.end()) {
-    std::tie(match.c, match.m, match.d, match.aResult) = known->second;
+  // Keyed by the listed drive rather than its names: a computer listed twice only costs a second
+  // find of the same place.
+  const void* application = match.v.ParentNode().Id();
+  auto& here = placesFound_[appFolder];
+  auto known = std::find_if(here.begin(), here.end(), [&](const FoundPlace& place) {
+    return place.drive == record.DriveIndex() && place.application == application;
+  });
+  if (known != here.end()) {
+    match.c = known->c;
+    match.m = known->m;
+    match.d = known->d;
+    match.aResult = known->a;
   } else if (FindPlace(match, record, appFolder)) {
-    placesFound_.emplace(std::move(place),
-                         std::make_tuple(match.c, match.m, match.d, match.aResult));
+    here.push_back({record.DriveIndex(), application, match.c, match.m, match.d, match.aResult});
   }
   if (match.drafting && match.aResult) {
     auto [at, added] = match.draftOf.try_emplace(match.aResult.Id(), match.drafts.size());

@@ -49,6 +49,10 @@ const std::string& LocalFileRecord::EncodedDrive() const {
   return index_->drives_[index_->folders_[record.folder].drive].encodedDrive;
 }
 
+uint32_t LocalFileRecord::DriveIndex() const {
+  return index_->folders_[index_->records_[record_].folder].drive;
+}
+
 const std::string& LocalFileRecord::Folder() const {
   return index_->folders_[index_->records_[record_].folder].folder;
 }
@@ -85,7 +89,14 @@ size_t LocalFileIndex::Matches::size() const {
   return count;
 }
 
-void LocalFileIndex::Reserve(size_t files) { records_.reserve(files); }
+void LocalFileIndex::Reserve(size_t files) {
+  records_.reserve(files);
+  // Room for every file to have a name of its own: regrowing a table of millions of keys costs
+  // more than the slots it would save.
+  size_t slots = 64;
+  while (slots < 2 * files) slots *= 2;
+  if (slots > slots_.size()) Rehash(slots);
+}
 
 void LocalFileIndex::AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
                               std::string drive, std::string encodedDrive) {
@@ -147,8 +158,9 @@ size_t LocalFileIndex::Probe(std::string_view key, uint32_t hash) const {
   }
 }
 
-void LocalFileIndex::Grow() {
-  size_t size = std::max<size_t>(64, 2 * slots_.size());
+void LocalFileIndex::Grow() { Rehash(std::max<size_t>(64, 2 * slots_.size())); }
+
+void LocalFileIndex::Rehash(size_t size) {
   std::vector<Slot> old = std::exchange(slots_, std::vector<Slot>(size));
   size_t mask = slots_.size() - 1;
   for (const Slot& slot : old) {

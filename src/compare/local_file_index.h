@@ -19,6 +19,8 @@ class LocalFileRecord {
   bool LocalMachine() const;
   const std::string& Drive() const;
   const std::string& EncodedDrive() const;
+  // The listed drive the record is on: the same for every record of one drive entry.
+  uint32_t DriveIndex() const;
   const std::string& Folder() const;
   const std::string& EncodedFolder() const;
   std::string_view Filename() const;
@@ -70,7 +72,7 @@ class LocalFileIndex {
     uint32_t first_ = kNone;
   };
 
-  // Room for `files` records, made at once (names share keys, so the key table grows as needed).
+  // Room for `files` records and as many names, made at once.
   void Reserve(size_t files);
 
   // The computer and drive of the records added next.
@@ -123,6 +125,7 @@ class LocalFileIndex {
   // The slot holding `key`, or the empty slot where it would go.
   size_t Probe(std::string_view key, uint32_t hash) const;
   void Grow();
+  void Rehash(size_t size);  // a power of two
   uint32_t AddName(std::string_view name);
 
   std::vector<DriveEntry> drives_;

@@ -87,8 +87,10 @@ pugi::xml_node Document::Impl::NamePool() {
 }
 
 pugi::xml_node Document::Impl::Prototype(std::string_view name, bool attribute) {
-  size_t slot = (name.size() * 7 + (name.empty() ? 0 : name.back()) + (attribute ? 1 : 0)) %
-                recentPrototypes.size();
+  // The first letter counts too: names that differ only there ("f_bitmask", "p_bitmask") are
+  // set in turn over a whole document.
+  size_t ends = name.empty() ? 0 : static_cast<size_t>(name.front()) * 31 + name.back();
+  size_t slot = (name.size() * 7 + ends + (attribute ? 1 : 0)) % recentPrototypes.size();
   RecentPrototype& recent = recentPrototypes[slot];
   if (recent.prototype && recent.attribute == attribute && recent.name == name) {
     return recent.prototype;
