@@ -308,7 +308,13 @@ bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
 
 std::string Compare::CandidatePath(const LocalFileRecord& record, const std::string& name) {
   std::string path;
-  if (!record.LocalMachine()) path = "\\\\" + record.Machine() + "\\";
+  path.reserve(record.Machine().size() + record.Drive().size() + record.Folder().size() +
+               name.size() + 3);
+  if (!record.LocalMachine()) {
+    path += "\\\\";
+    path += record.Machine();
+    path += '\\';
+  }
   path += record.Drive();
   path += record.Folder();
   path += name;

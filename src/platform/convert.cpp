@@ -70,6 +70,14 @@ double ParseNumber(std::string_view text) {
   if (pos < text.size() && (text[pos] == '+' || text[pos] == '-')) negative = text[pos++] == '-';
   size_t mantissaStart = pos;
   size_t intEnd = SkipDigits(text, pos);
+  // Whole numbers of up to 15 digits, nearly every number read, are exact in a double: they skip
+  // the general parse.
+  if (intEnd == text.size() && intEnd > pos && intEnd - pos <= 15) {
+    int64_t whole = 0;
+    for (char c : text.substr(pos)) whole = whole * 10 + (c - '0');
+    auto value = static_cast<double>(whole);
+    return negative ? -value : value;
+  }
   bool hasDigits = intEnd > pos;
   pos = intEnd;
   if (pos < text.size() && text[pos] == '.') {

@@ -114,6 +114,11 @@ TEST(ConvertTest, ToDouble) {
       {" -0.5 ", -0.5, kOk},
       {"+.125", 0.125, kOk},
       {"&H10", 16, kOk},
+      {" -007 ", -7, kOk},
+      {"999999999999999", 999999999999999.0, kOk},
+      // Past 2^53 whole numbers round like any other: 2^53 + 1 reads as 2^53.
+      {"9007199254740993", 9007199254740992.0, kOk},
+      {"12345678901234567890", 12345678901234567890.0, kOk},
       {"1.7976931348623157e308", std::numeric_limits<double>::max(), kOk},
       {"1e-400", 0, kOk},
       {"1e309", 0, kOverflow},
