@@ -8,8 +8,8 @@
 #   WORK_DIR   where the data sets go (default: /tmp/trl-compare-bench); kept between runs
 #   RUNS       environment: runs per scale, the best counts (default: 5)
 #   INSTRUCTIONS=1  environment: also count the instructions Compare executes at each scale, under
-#              valgrind (minutes at full scale); unlike time on a shared machine, the count does
-#              not move from run to run
+#              valgrind (many minutes at full scale, the installed files being hashed there
+#              too); unlike time on a shared machine, the count does not move from run to run
 set -euo pipefail
 
 build_dir=$(realpath -m "${1:-build}")
