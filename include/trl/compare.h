@@ -92,12 +92,14 @@ class Compare : public Worker {
 
   int16_t RemoveIncompleteApplications(const std::string& id, int32_t highestSequence);
   void RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence);
-  // Takes out one copy without versions, with whatever that leaves empty; false when none is left.
-  bool RemoveEmptiedCopy(const std::string& id);
+  // Takes out the copies with this a_id left without versions, each with whatever that leaves
+  // empty, in document order.
+  void RemoveEmptiedCopies(const std::string& id);
+  // Takes out one copy, or the folder, drive or computer it alone fills.
+  static void RemoveEmptiedCopy(xml::Node copy);
   void RememberCopy(xml::Node copy);
   // The copies of the application with this a_id, in document order.
   std::vector<xml::Node> CopiesOf(const std::string& id) const;
-  void ForgetCopy(const std::string& id, xml::Node copy);
 
   std::unique_ptr<fs::FileSystem> objFSO;
   std::unique_ptr<Schema> objSchema;

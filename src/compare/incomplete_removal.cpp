@@ -30,11 +30,7 @@ int16_t Compare::RemoveIncompleteApplications(const std::string& id, int32_t hig
   std::vector<xml::Node> copies;
   on([&] { copies = CopiesOf(id); });
   for (const xml::Node& copy : copies) RemoveIncompleteVersions(copy, highestSequence);
-  bool removed = true;
-  while (removed) {
-    removed = false;
-    on([&] { removed = RemoveEmptiedCopy(id); });
-  }
+  on([&] { RemoveEmptiedCopies(id); });
   int16_t remaining = 0;
   on([&] { remaining = ToInt16(static_cast<double>(CopiesOf(id).size())); });
   return remaining;
@@ -69,17 +65,37 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
   on([&] { copy.SetAttribute(vocab::a_max_seq, std::to_string(highestSequence)); });
 }
 
-bool Compare::RemoveEmptiedCopy(const std::string& id) {
-  auto copies = copiesById_.find(id);
-  if (copies == copiesById_.end() || id.find('\'') != std::string::npos) return false;
-  xml::Node copy;
-  for (const ApplicationCopy& candidate : copies->second) {
-    if (candidate.element.CountChildElements(vocab::v, 1) == 0) {
-      copy = candidate.element;
-      break;
+void Compare::RemoveEmptiedCopies(const std::string& id) {
+  auto found = copiesById_.find(id);
+  if (found == copiesById_.end() || id.find('\'') != std::string::npos) return;
+  // Taking a copy out empties no other, so one pass in document order takes out what picking the
+  // first empty copy again and again would, without a scan from the start each time. A failure
+  // stops it there, the copies from that one on staying.
+  std::vector<ApplicationCopy>& copies = found->second;
+  size_t kept = 0, at = 0;
+  auto close = [&] {
+    copies.erase(std::move(copies.begin() + static_cast<ptrdiff_t>(at), copies.end(),
+                           copies.begin() + static_cast<ptrdiff_t>(kept)),
+                 copies.end());
+  };
+  try {
+    for (; at < copies.size(); ++at) {
+      xml::Node copy = copies[at].element;
+      if (copy.CountChildElements(vocab::v, 1) != 0) {
+        copies[kept++] = copies[at];
+        continue;
+      }
+      RemoveEmptiedCopy(copy);
+      knownCopies_.erase(copy.Id());
     }
+  } catch (...) {
+    close();
+    throw;
   }
-  if (!copy) return false;
+  close();
+}
+
+void Compare::RemoveEmptiedCopy(xml::Node copy) {
   // With a single computer in the results, the computer goes with its last drive; with several,
   // only the drive goes and the computer stays.
   xml::Node d = copy.ParentNode();
@@ -99,8 +115,6 @@ bool Compare::RemoveEmptiedCopy(const std::string& id) {
   } else {
     c.RemoveChild(m);
   }
-  ForgetCopy(id, copy);
-  return true;
 }
 
 void Compare::RememberCopy(xml::Node copy) {
@@ -128,12 +142,6 @@ std::vector<xml::Node> Compare::CopiesOf(const std::string& id) const {
   if (found == copiesById_.end()) return copies;
   for (const ApplicationCopy& copy : found->second) copies.push_back(copy.element);
   return copies;
-}
-
-void Compare::ForgetCopy(const std::string& id, xml::Node copy) {
-  knownCopies_.erase(copy.Id());
-  auto& copies = copiesById_[id];
-  std::erase_if(copies, [&](const ApplicationCopy& entry) { return entry.element == copy; });
 }
 
 }  // namespace trl

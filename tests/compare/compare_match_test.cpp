@@ -219,6 +219,28 @@ TEST_F(CompareMatchTest, FindsReachTheFirstCopyWrittenAsTheirId) {
   }
 }
 
+// Every copy an application's pruning empties goes, each taking its folder; the copy between them
+// and the next application's copies stay.
+TEST_F(CompareMatchTest, PruningTakesOutEveryEmptiedCopyOfTheApplication) {
+  for (const char* folder : {"one", "two", "three"}) {
+    tree_.AddFolder(folder);
+    tree_.AddFile(std::string(folder) + "/app.exe");
+  }
+  tree_.AddFile("two/x.dll");
+  tree_.AddFile("three/tool.exe");
+  auto results =
+      Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
+          R"(<f f_id="2" f_name="x.dll" f_weight="1"/></v></a>)"
+          R"(<a a_id="2"><v v_id="1" v_seq="1"><f f_id="1" f_name="tool.exe" f_weight="1"/>)"
+          R"(</v></a></fp>)",
+          LocalFiles({{Folder("one"), {"app.exe"}},
+                      {Folder("three"), {"app.exe", "tool.exe"}},
+                      {Folder("two"), {"app.exe", "x.dll"}}}));
+  EXPECT_THAT(ValuesOf(*results, "//d", "d_text"),
+              ElementsAre(Lower(Folder("two")), Lower(Folder("three"))));
+  EXPECT_THAT(ValuesOf(*results, "//d/a", "a_id"), ElementsAre("1", "2"));
+}
+
 TEST_F(CompareMatchTest, EmptiedBranchesGoUpToTheComputerOnlyWhenItIsTheOnlyOne) {
   tree_.AddFolder("share");
   tree_.AddFile("share/tool.exe");
