@@ -18,7 +18,6 @@
 #include <algorithm>
 #include <array>
 #include <bit>
-#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <cstdint>
@@ -35,6 +34,8 @@
 #include <vector>
 
 #include "rng.h"
+#include "schema/schema.h"
+#include "words.h"
 
 namespace {
 
@@ -45,7 +46,10 @@ constexpr int kFilesPerVersion = 20;
 constexpr size_t kInstallEvery = 20;
 constexpr uint64_t kRandomStart = 20260101;
 
+using trl::bench::kStemWords;
+using trl::bench::Lower;
 using trl::bench::Rng;
+using trl::bench::Upper;
 
 // A start for an Rng of its own per item, so an item's data does not depend on the order or the
 // number of other items drawn before it.
@@ -145,12 +149,6 @@ constexpr std::array<std::string_view, 30> kProducts = {
 constexpr std::array<std::string_view, 10> kEditions = {
     "", "", "", "", "Pro", "Lite", "Suite", "Express", "Server", "Plus"};
 
-constexpr std::array<std::string_view, 36> kStemWords = {
-    "App",    "Core",   "Setup",  "Update", "Helper", "Service", "Agent",  "Config", "Render",
-    "Media",  "Audio",  "Video",  "Net",    "Crypto", "Font",    "Image",  "Print",  "Sync",
-    "Launch", "Host",   "Shell",  "Util",   "Data",   "Report",  "Viewer", "Editor", "Codec",
-    "Driver", "Plugin", "Script", "Theme",  "Cache",  "Log",     "Index",  "Parser", "Install"};
-
 constexpr std::array<std::string_view, 20> kExtensions = {
     "dll", "exe", "dat", "xml",  "ini", "cfg", "pak", "png", "ico", "ttf",
     "qm",  "chm", "txt", "json", "bin", "cab", "sys", "ocx", "lic", "manifest"};
@@ -179,37 +177,6 @@ constexpr std::array<std::string_view, 10> kSystemFolders = {
     "\\Windows\\Fonts",    "\\Windows\\Help",
     "\\Windows\\Temp",     "\\Windows\\inf",
     "\\Windows\\Media",    "\\Windows\\System32\\en-US"};
-
-std::string Lower(std::string_view s) {
-  std::string out(s);
-  for (char& c : out) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return out;
-}
-
-std::string Upper(std::string_view s) {
-  std::string out(s);
-  for (char& c : out) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-  return out;
-}
-
-// The stored form of a name: lower-cased, with the bytes the readers split on escaped as %XX.
-// Generated texts never hold them; only the OUT_DIR path can.
-std::string EncodeName(std::string_view text) {
-  static constexpr char kHex[] = "0123456789ABCDEF";
-  std::string encoded;
-  encoded.reserve(text.size());
-  for (char c : Lower(text)) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte == 0x7F || c == '%' || c == '\'' || c == '"') {
-      encoded += '%';
-      encoded += kHex[byte >> 4];
-      encoded += kHex[byte & 0xF];
-    } else {
-      encoded += c;
-    }
-  }
-  return encoded;
-}
 
 std::string Extension(Rng& rng) {
   const std::string_view ext = rng.Pick(kExtensions);
@@ -633,7 +600,8 @@ class LocalFilesWriter {
     xml << "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<trl_applicationdata";
     xml.Attr("search_start", "2026-01-01 00:00:00").Attr("search_end", "2026-01-01 00:10:00");
     xml << ">\n  <c c_id=\"1\" c_text=\"localhost\" c_name=\"localhost\" c_local=\"1\">\n    <m";
-    xml.Attr("m_id", 1).Attr("m_text", drive).Attr("m_name", EncodeName(drive)) << ">\n";
+    xml.Attr("m_id", 1).Attr("m_text", drive).Attr("m_name", trl::Schema().EncodeName(drive))
+        << ">\n";
     for (size_t d = 0; d < folders_.size(); ++d) {
       const LocalFolder& folder = folders_[d];
       xml << "      <d";

@@ -11,7 +11,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <cmath>
@@ -27,12 +26,16 @@
 #include <vector>
 
 #include "rng.h"
+#include "words.h"
 
 namespace {
 
 constexpr int kMaxDepth = 8;
 
+using trl::bench::kStemWords;
+using trl::bench::Lower;
 using trl::bench::Rng;
+using trl::bench::Upper;
 
 constexpr std::array<std::string_view, 40> kFolderWords = {
     "Program", "Common", "Shared",  "bin",       "lib",     "Resources", "Plugins",    "Data",
@@ -45,12 +48,6 @@ constexpr std::array<std::string_view, 12> kLocales = {"en-US", "de-DE", "fr-FR"
                                                        "zh-CN", "pt-BR", "es-ES", "it-IT",
                                                        "ru-RU", "ko-KR", "nl-NL", "sv-SE"};
 
-constexpr std::array<std::string_view, 36> kStemWords = {
-    "App",    "Core",   "Setup",  "Update", "Helper", "Service", "Agent",  "Config", "Render",
-    "Media",  "Audio",  "Video",  "Net",    "Crypto", "Font",    "Image",  "Print",  "Sync",
-    "Launch", "Host",   "Shell",  "Util",   "Data",   "Report",  "Viewer", "Editor", "Codec",
-    "Driver", "Plugin", "Script", "Theme",  "Cache",  "Log",     "Index",  "Parser", "Install"};
-
 constexpr std::array<std::string_view, 30> kExtensions = {
     "dll", "exe", "sys", "ocx",  "cab",  "msi", "txt", "rtf", "pdf",      "chm",
     "xml", "ini", "cfg", "json", "dat",  "bin", "pak", "png", "ico",      "bmp",
@@ -58,18 +55,6 @@ constexpr std::array<std::string_view, 30> kExtensions = {
 
 constexpr std::array<std::string_view, 8> kIconSizes = {"16x16", "24x24",   "32x32",   "48x48",
                                                         "64x64", "128x128", "256x256", "512x512"};
-
-std::string Lower(std::string_view s) {
-  std::string out(s);
-  for (char& c : out) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return out;
-}
-
-std::string Upper(std::string_view s) {
-  std::string out(s);
-  for (char& c : out) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-  return out;
-}
 
 std::string Version(Rng& rng) {
   std::string v = std::to_string(rng.Below(20)) + "." + std::to_string(rng.Below(10));
