@@ -72,7 +72,6 @@ class Locate : public Worker {
   void SubscribeTo(Stage& stage);
   // Relays the stage's progress reports while this worker's client follows them (a stage that
   // nobody follows does not build its reports).
-  void RelayProgress(Stage& stage);
   void Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicationOptions,
                int16_t filterOptions, xml::DocumentPtr& fingerprint, xml::DocumentPtr& userData);
 

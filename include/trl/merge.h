@@ -58,6 +58,8 @@ class Merge : public Worker {
   bool MissingApplicationsSearch();
   bool MissingApplication(xml::Node& application);
   xml::Node MissingList();
+  // Takes a missing application out of the old results with the places it leaves empty.
+  void RemoveFromTree(const OnError& on, xml::Node application);
 
   std::unique_ptr<Schema> objSchema;
 

@@ -44,7 +44,15 @@ class Worker {
   // Events, raised only while Asynchronous is true.
   void OnStatusUpdate(StatusUpdateHandler handler) { statusUpdate_ = std::move(handler); }
   void OnProgressUpdate(ProgressUpdateHandler handler) { progressUpdate_ = std::move(handler); }
-  bool ProgressObserved() const { return static_cast<bool>(progressUpdate_); }
+  // A handler that passes reports on: `followed` tells, at each report, whether anyone is
+  // following them further, so that nobody's reports are not even built.
+  void OnProgressUpdate(ProgressUpdateHandler handler, std::function<bool()> followed) {
+    progressUpdate_ = std::move(handler);
+    progressFollowed_ = std::move(followed);
+  }
+  bool ProgressObserved() const {
+    return progressUpdate_ && (!progressFollowed_ || progressFollowed_());
+  }
 
  protected:
   Worker(std::string_view className, int32_t mode);
@@ -109,6 +117,7 @@ class Worker {
   std::unique_ptr<xml::Document> progress_;
   StatusUpdateHandler statusUpdate_;
   ProgressUpdateHandler progressUpdate_;
+  std::function<bool()> progressFollowed_;
 };
 
 template <class T, class Factory>

@@ -23,40 +23,44 @@ namespace {
 
 // Whether the file's value of the property equals the expected one, compared the way the kind's
 // values compare. Only the kind asked for is read, so a file is hashed only when a property wants
-// its digest.
+// its digest; the local value is read before the expected one, and an unknown kind reads neither.
 bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& schema,
                     const fs::File* file, LocalFileFacts& facts) {
   auto local = [&](auto& learnt, auto form) -> decltype(auto) {
     return learnt.Get([&] { return form(Use(file)); });
   };
-  bool agrees = false;
+  auto expected = [&]() -> const FingerprintFile::Property& {
+    if (property.expectedFailure) std::rethrow_exception(property.expectedFailure);
+    if (property.conversionFailure) std::rethrow_exception(property.conversionFailure);
+    return property;
+  };
   switch (property.kind) {
-    case 1:
-      agrees = local(facts.version, [&](const fs::File& f) {
-                 return LowerCase(schema.ReadPropertyType1(f));
-               }) == property.expectedText;
-      break;
-    case 2:
-      agrees = local(facts.size, [&](const fs::File& f) {
-                 return ToInt32(static_cast<double>(schema.ReadPropertyType2(f)));
-               }) == property.expectedNumber;
-      break;
-    case 3:
-      agrees = local(facts.digest, [&](const fs::File& f) {
-                 return LowerCase(schema.ReadPropertyType3(f));
-               }) == property.expectedText;
-      break;
-    case 4:
-      agrees = local(facts.written, [&](const fs::File& f) {
-                 return FormatDateTime(schema.ReadPropertyType4(f));
-               }) == property.expectedText;
-      break;
+    case 1: {
+      const std::string& version = local(
+          facts.version, [&](const fs::File& f) { return LowerCase(schema.ReadPropertyType1(f)); });
+      return version == expected().expectedText;
+    }
+    case 2: {
+      int32_t size = local(facts.size, [&](const fs::File& f) {
+        return ToInt32(static_cast<double>(schema.ReadPropertyType2(f)));
+      });
+      return size == expected().expectedNumber;
+    }
+    case 3: {
+      const std::string& digest = local(
+          facts.digest, [&](const fs::File& f) { return LowerCase(schema.ReadPropertyType3(f)); });
+      return digest == expected().expectedText;
+    }
+    case 4: {
+      const std::string& written = local(facts.written, [&](const fs::File& f) {
+        return FormatDateTime(schema.ReadPropertyType4(f));
+      });
+      return written == expected().expectedText;
+    }
     default:
       Raise(kErrUnknownPropertyType, "Unknown property type: " + std::to_string(property.kind),
             kClass, compare::kMatchFileLabel);
   }
-  if (property.conversionFailure) std::rethrow_exception(property.conversionFailure);
-  return agrees;
 }
 
 }  // namespace
@@ -77,10 +81,7 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
   for (const FingerprintFile::Property& property : f.Properties()) {
     for (const auto& failure : property.readFailures) FingerprintFile::Replay(on, failure);
     bool agrees = false;
-    on([&] {
-      if (property.expectedFailure) std::rethrow_exception(property.expectedFailure);
-      agrees = PropertyAgrees(property, Use(objSchema), file, facts);
-    });
+    on([&] { agrees = PropertyAgrees(property, Use(objSchema), file, facts); });
     if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });
   }
   return mask;

@@ -17,15 +17,16 @@ int16_t FlagAsUnknown(xml::Node a) {
   on([&] { count = CountVersions(a); });
   std::vector<xml::Node> versions;
   on([&] { versions = a.ChildElements(vocab::v); });
+  // A value that cannot be read stays what the version before gave.
+  int32_t most = 0, reached = 0;
+  std::string id;
   for (xml::Node& v : versions) {
-    bool partly = false;
-    on([&] { partly = PartlyMatched(v); });
-    if (!partly) continue;
-    on([&] {
-      // A version relabelled before has lost its own v_id: its v_guess still holds it.
-      std::string id = TextOf(v, vocab::v_id);
-      if (id != kUnidentified) v.SetAttribute(vocab::v_guess, id);
-    });
+    on([&] { most = Int32Of(v, vocab::v_max); });
+    on([&] { reached = Int32Of(v, vocab::v_act); });
+    if (most == reached) continue;
+    on([&] { id = TextOf(v, vocab::v_id); });
+    // A version relabelled before has lost its own v_id: its v_guess still holds it.
+    if (id != kUnidentified) on([&] { v.SetAttribute(vocab::v_guess, id); });
     Relabel(on, v, kUnsupportedVersion);
   }
   return count;
@@ -37,10 +38,13 @@ int16_t FlagAsUnmanaged(xml::Node a) {
   on([&] { count = CountVersions(a); });
   std::vector<xml::Node> versions;
   on([&] { versions = a.ChildElements(vocab::v); });
+  // Found files that differ from the version's files, either way; a value that cannot be read
+  // stays what the version before gave.
+  int32_t files = 0, found = 0;
   for (const xml::Node& v : versions) {
-    bool lacking = false;  // found files that differ from the version's files, either way
-    on([&] { lacking = FileCountOf(v) != ToInt32(TextOf(v, vocab::f_act)); });
-    if (lacking) on([&] { a.SetAttribute(vocab::a_manage, kUnmanaged); });
+    on([&] { files = FileCountOf(v); });
+    on([&] { found = Int32Of(v, vocab::f_act); });
+    if (files != found) on([&] { a.SetAttribute(vocab::a_manage, kUnmanaged); });
   }
   return count;
 }

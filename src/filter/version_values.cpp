@@ -28,10 +28,10 @@ int32_t MissingFilesOf(const xml::Node& v) {
   return static_cast<int32_t>(missing);
 }
 
-int32_t FileCountOf(const xml::Node& v) { return ToInt32(TextOf(v, vocab::f_max)); }
+int32_t FileCountOf(const xml::Node& v) { return Int32Of(v, vocab::f_max); }
 
-bool PartlyMatched(const xml::Node& v) {
-  return ToInt32(TextOf(v, vocab::v_max)) != ToInt32(TextOf(v, vocab::v_act));
+int32_t Int32Of(const xml::Node& v, std::string_view attribute) {
+  return ToInt32(TextOf(v, attribute));
 }
 
 int16_t CountVersions(const xml::Node& a) {

@@ -18,8 +18,8 @@ double WeightOf(const xml::Node& v);
 int32_t MissingFilesOf(const xml::Node& v);
 // f_max.
 int32_t FileCountOf(const xml::Node& v);
-// Whether v_max and v_act differ, read as 32-bit numbers.
-bool PartlyMatched(const xml::Node& v);
+// Any whole-number attribute, as a 32-bit number.
+int32_t Int32Of(const xml::Node& v, std::string_view attribute);
 
 // How many versions the application holds, as a 16-bit number.
 int16_t CountVersions(const xml::Node& a);

@@ -134,7 +134,7 @@ void Worker::RaiseProgressUpdate(const std::string& update) {
 
 void Worker::RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill) {
   // Nobody listening: the report is not even built (a walk reports every folder).
-  if (!asynchronous_ || !progressUpdate_) return;
+  if (!asynchronous_ || !ProgressObserved()) return;
   fill(NewProgressElement());
   RaiseProgressUpdate(progress_->Xml());
 }

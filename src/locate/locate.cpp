@@ -114,7 +114,6 @@ void Locate::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicat
                                                       trlFilter.get(), trlMerge.get()}) {
     on([&] { Use(stage).Asynchronous(Asynchronous()); });
   }
-  for (auto& stage : stages_) RelayProgress(*stage);
   Log("Assigned options", kStartLabel);
 
   ProgressMode(stageMode_);

@@ -19,16 +19,9 @@ void Locate::SubscribeTo(Stage& stage) {
       [this, &stage](const std::string& update, const std::string& results) {
         StatusUpdate(stage, update, results);
       });
-}
-
-void Locate::RelayProgress(Stage& stage) {
-  if (!stage.worker) return;
-  if (!ProgressObserved()) {
-    stage.worker->OnProgressUpdate(nullptr);
-    return;
-  }
   stage.worker->OnProgressUpdate(
-      [this, &stage](const std::string& update) { ProgressUpdate(stage, update); });
+      [this, &stage](const std::string& update) { ProgressUpdate(stage, update); },
+      [this] { return ProgressObserved(); });
 }
 
 void Locate::StatusUpdate(Stage& stage, const std::string& strUpdateXML,

@@ -8,6 +8,7 @@
 #include "frame/every_element.h"
 #include "frame/fixes.h"
 #include "frame/general.h"
+#include "frame/highest_id.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
 #include "merge/merge_names.h"
@@ -74,25 +75,10 @@ void Merge::SeedCounters() {
   bool empty = true;
   on([&] { empty = Use(objOldResultsDOM).DocumentElement().FirstChild().IsNull(); });
   if (empty) return;
-  struct Level {
-    std::string_view tag, id;
-    int32_t& counter;
-  };
-  for (const Level& level : {Level{vocab::c, vocab::c_id, lngComputerCounter},
-                             Level{vocab::m, vocab::m_id, lngDriveCounter},
-                             Level{vocab::d, vocab::d_id, lngFolderCounter}}) {
-    // The highest id in use, so that what the merge adds is numbered after it.
-    std::vector<xml::Node> elements;
-    on([&] { elements = EveryElement(*objOldResultsDOM, level.tag); });
-    std::optional<int32_t> highest;
-    for (const xml::Node& element : elements) {
-      on([&] {
-        int32_t id = ToInt32(TextOf(element, level.id));
-        highest = highest ? std::max(*highest, id) : id;
-      });
-    }
-    level.counter = highest.value_or(0);
-  }
+  xml::Node root = objOldResultsDOM->DocumentElement();
+  lngComputerCounter = HighestId(on, root, vocab::c);
+  lngDriveCounter = HighestId(on, root, vocab::m);
+  lngFolderCounter = HighestId(on, root, vocab::d);
 }
 
 void Merge::CountApplications() {
@@ -164,8 +150,8 @@ bool Merge::MergeFolder(xml::Node newFolder, xml::Node oldFolder, const Defaults
   on([&] { applications = newFolder.ChildElements(vocab::a); });
   std::string name;
   for (const xml::Node& a : applications) {
-    // Read first: the merge moves the element into the old results.
-    on([&] { name = TextOf(a, vocab::a_name); });
+    // Read first, and only for the progress report: the merge moves the element away.
+    if (Asynchronous()) on([&] { name = TextOf(a, vocab::a_name); });
     MergeApplication(a, oldFolder, defaults);
     on([&] { e_match_merged = CheckedAdd(e_match_merged, 1); });
     RaiseApplicationProgress(name);

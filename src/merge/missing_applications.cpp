@@ -79,33 +79,7 @@ bool Merge::MissingApplication(xml::Node& application) {
   on([&] { application.SetAttribute(vocab::a_missing, "1"); });
   on([&] { list.AppendChild(application.CloneNode(false)); });
 
-  // Out of the tree, with the folder, drive and (when it is the only one) computer it leaves
-  // empty: the highest level that empties goes, taking the rest with it.
-  on([&] {
-    xml::Node folder = application.ParentNode();
-    xml::Node drive = folder.ParentNode();
-    xml::Node computer = drive.ParentNode();
-    xml::Node root = objOldResultsDOM->DocumentElement();
-    merge::PlaceIndex& places = Use(oldPlaces_);
-    bool folderEmpties = folder.CountChildElements(vocab::a, 2) == 1;
-    bool driveEmpties = folderEmpties && drive.CountChildElements(vocab::d, 2) == 1;
-    bool computerGoes =
-        driveEmpties && computer.CountChildElements(vocab::m, 2) == 1 && places.Computers() == 1;
-    if (computerGoes) {
-      places.Removing(computer);
-      root.RemoveChild(computer);
-      places.ComputerRemoved();
-    } else if (driveEmpties) {
-      places.Removing(drive);
-      computer.RemoveChild(drive);
-    } else if (folderEmpties) {
-      places.Removing(folder);
-      drive.RemoveChild(folder);
-    } else {
-      places.Removing(application);
-      folder.RemoveChild(application);
-    }
-  });
+  RemoveFromTree(on, application);
   on([&] { e_match_missing = CheckedAdd(e_match_missing, 1); });
 
   Progress(on, [&](xml::Node e) {
@@ -113,6 +87,40 @@ bool Merge::MissingApplication(xml::Node& application) {
     AddStatusCounters(e);
   });
   return true;
+}
+
+void Merge::RemoveFromTree(const OnError& on, xml::Node application) {
+  xml::Node folder, drive, computer, root;
+  on([&] { folder = application.ParentNode(); });
+  on([&] { drive = folder.ParentNode(); });
+  on([&] { computer = drive.ParentNode(); });
+  on([&] { root = objOldResultsDOM->DocumentElement(); });
+
+  // Each level that the removal leaves empty goes too, the highest first; each removal is a step
+  // of its own, so one that fails (a computer that is not the root's child) leaves the rest to run.
+  bool folderEmpties = false, driveEmpties = false, computerGoes = false;
+  on([&] { folderEmpties = folder.CountChildElements(vocab::a, 2) == 1; });
+  if (folderEmpties) on([&] { driveEmpties = drive.CountChildElements(vocab::d, 2) == 1; });
+  if (driveEmpties) {
+    on([&] {
+      computerGoes =
+          computer.CountChildElements(vocab::m, 2) == 1 && Use(oldPlaces_).Computers() == 1;
+    });
+  }
+  bool out = false;  // once a level has gone, what it held went with it
+  auto takeOut = [&](xml::Node parent, xml::Node child) {
+    out = on([&] {
+      if (child.ParentNode() == parent) Use(oldPlaces_).Removing(child);
+      parent.RemoveChild(child);
+    });
+  };
+  if (computerGoes) {
+    takeOut(root, computer);
+    if (out) on([&] { Use(oldPlaces_).ComputerRemoved(); });
+  }
+  if (driveEmpties && !out) takeOut(computer, drive);
+  if (folderEmpties && !out) takeOut(drive, folder);
+  if (!out) takeOut(folder, application);
 }
 
 }  // namespace trl

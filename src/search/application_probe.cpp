@@ -58,9 +58,10 @@ bool Search::ProbeApplication(xml::Node application) {
     for (const xml::Node& f : files) {
       on([&] { r.fName = LowerCase(TextOf(f, vocab::f_name)); });
       on([&] { r.fRelpath = TextOf(f, vocab::f_relpath); });
-      on([&] { r.fFullpath = TextOf(f, vocab::f_fullpath); });
       std::string probeFolder = r.folder;
       if (!r.fRelpath.empty()) {
+        // Only a relative path says whether it is whole; authored files often carry no flag.
+        on([&] { r.fFullpath = TextOf(f, vocab::f_fullpath); });
         std::string relpath = r.fRelpath;
         if (!relpath.ends_with('\\')) relpath += '\\';
         if (r.fFullpath == "True") {

@@ -7,6 +7,7 @@
 #include "frame/error_handler.h"
 #include "frame/fixes.h"
 #include "frame/general.h"
+#include "frame/highest_id.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
 #include "platform/clock.h"
@@ -24,22 +25,6 @@ using search::kRunLabel;
 namespace {
 
 constexpr int32_t kSearchMode = 1;
-
-// The highest id of the elements with this tag anywhere in the document: the number in each one's
-// first attribute, 0 when there is none. Ids that are not whole numbers cannot clash with the
-// ones the run adds and are passed over.
-int32_t HighestId(xml::Node root, std::string_view tag) {
-  int32_t highest = 0;
-  for (const xml::Node& element : root.GetElementsByTagName(tag)) {
-    auto attributes = element.Attributes();
-    if (attributes.empty()) continue;
-    try {
-      highest = std::max(highest, ToInt32(attributes.front().second));
-    } catch (const Failure&) {
-    }
-  }
-  return highest;
-}
 
 }  // namespace
 
@@ -102,9 +87,10 @@ void Search::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicat
 }
 
 void Search::SetCountersFrom(xml::Node root) {
-  lngComputerCounter = HighestId(root, vocab::c);
-  lngDriveCounter = HighestId(root, vocab::m);
-  lngFolderCounter = HighestId(root, vocab::d);
+  OnError on{kClass, search::kStartLabel};
+  lngComputerCounter = HighestId(on, root, vocab::c);
+  lngDriveCounter = HighestId(on, root, vocab::m);
+  lngFolderCounter = HighestId(on, root, vocab::d);
 }
 
 void Search::RunBody() {
