@@ -62,6 +62,12 @@ TEST_F(FilterRulesTest, RulesKeepAndLabelVersionsAndTheApplicationTakesTheVerdic
        "",
        "1 0 0",
        "N/A"},
+      {LowWeights | LowFileCount,
+       {"1 10 10 3 3", "2 10 10 4 4", "3 5 10 5 5"},
+       "",
+       "",
+       "1 0 0",
+       "N/A"},
       {None, {"1 1 2 1 1", "2 0 2 1 1"}, "1 2", "", "1 -1 -1", "Unsupported Version"},
       {kAll, {"1 3 3 1 2", "2 3 3 1 2", "3 2 3 1 2"}, "-1", "1", "0 -1 -1", "Multiple Matches"},
       // The first of the versions left is kept, named by whether it matched fully.
@@ -179,52 +185,70 @@ TEST_F(FilterRulesTest, AWeightThatCannotBeComputedIsReportedAndWrittenAsZero) {
   EXPECT_EQ(TakeReportedEvents(), failures);
 }
 
-TEST_F(FilterRulesTest, AValueThatCannotBeReadIsReportedByEachRuleAndTheVersionStays) {
+TEST_F(FilterRulesTest, AVersionThatCannotBeReadIsJudgedByTheValueReadBeforeIt) {
   struct Case {
     int16_t options;
-    std::string broken;  // beside "1 3 3 2 2"
-    const char* left;
+    std::vector<std::string> versions;
+    const char* left;     // v_id of the versions left
+    const char* guesses;  // their v_guess
+    const char* manage;
     std::vector<std::pair<int32_t, const char*>> failures;
   } cases[] = {
-      {MissingFiles | LowFileCount | FlagUnmanaged,
-       "2 3 3 2 x",
-       "1 2",
+      // Read first, nothing stands before it: 0 files, fewer than the most.
+      {LowFileCount,
+       {Version("1 3 3 2 x"), Version("2 3 3 2 2")},
+       "2",
+       "<absent>",
+       "1",
        {{kTypeMismatch, "FilterVersions"},
         {kTypeMismatch, "FilterVersions"},
-        {kTypeMismatch, "RemoveHighestMissingFiles"},
+        {kTypeMismatch, "RemoveLowestFileCount"}}},
+      // After a removal the scan starts again, and the version is read and reported again.
+      {LowFileCount,
+       {Version("1 3 3 2 2"), Version("2 3 3 2 x"), Version("3 3 3 1 1")},
+       "1 2",
+       "<absent> <absent>",
+       "1",
+       {{kTypeMismatch, "FilterVersions"},
+        {kTypeMismatch, "FilterVersions"},
         {kTypeMismatch, "RemoveLowestFileCount"},
+        {kTypeMismatch, "RemoveLowestFileCount"}}},
+      {FlagUnmanaged,
+       {Version("1 3 3 2 x"), Version("2 3 3 2 2")},
+       "1 2",
+       "<absent> <absent>",
+       "0",
+       {{kTypeMismatch, "FilterVersions"},
+        {kTypeMismatch, "FilterVersions"},
         {kTypeMismatch, "FlagAsUnmanaged"}}},
-      {MissingFiles,
-       "2 3 3 -1 2147483647",
-       "1 2",
-       {{kOverflow, "FilterVersions"}, {kOverflow, "RemoveHighestMissingFiles"}}},
-      // Scores that cannot be read: weight 0, so the weight rule takes the version out...
-      {LowWeights, "2 x 3 2 2", "1", {{kTypeMismatch, "Filter"}}},
-      // ... but no rule calls it fully or partly matched.
-      {DuplicateMatches,
-       "2 x 3 2 2",
-       "-1",
-       {{kTypeMismatch, "Filter"}, {kTypeMismatch, "RemoveDuplicateMatches"}}},
       {FlagUnknowns,
-       "2 x 3 2 2",
-       "1 2",
+       {Version("1 3 x 2 2"), Version("2 3 3 2 2")},
+       "-1 2",
+       "1 <absent>",
+       "1",
        {{kTypeMismatch, "Filter"}, {kTypeMismatch, "FlagAsUnknown"}}},
+      // A v_id that cannot be read leaves the text before it, here none, as the guess.
+      {FlagUnknowns,
+       {R"(<v v_max="3" v_act="1" f_max="1" f_act="1"/>)"},
+       "-1",
+       "",
+       "1",
+       {{kInvalidUseOfNull, "FlagAsUnknown"}}},
+      {DuplicateMatches,
+       {R"(<v v_max="3" v_act="3" f_max="1" f_act="1"/>)", Version("2 3 3 1 1")},
+       "-1",
+       "",
+       "1",
+       {{kInvalidUseOfNull, "RemoveDuplicateMatches"}}},
   };
   for (const Case& c : cases) {
-    SCOPED_TRACE(c.broken);
-    std::vector<std::string> versions{Version(c.broken), Version("1 3 3 2 2")};
-    if (c.options != DuplicateMatches) std::swap(versions[0], versions[1]);
-    auto document = Run(
-        c.options, Matches({Application("A", versions), Application("B", {Version("9 3 3 1 1")})}));
-    EXPECT_EQ(Joined(ValuesOf(*document, "//a[@a_name='A']/v", "v_id")), c.left);
-    if (c.options == DuplicateMatches) {
-      EXPECT_THAT(ValuesOf(*document, "//a/v", "v_name"), ElementsAre("Unsupported Version", "V9"));
-    }
-    EXPECT_THAT(ValuesOf(*document, "//a[@a_name='B']", "v_id"), ElementsAre("9"));
+    SCOPED_TRACE(Joined(c.versions));
+    auto document = Run(c.options, Matches({Application("A", c.versions)}));
+    EXPECT_EQ(Joined(ValuesOf(*document, "//a/v", "v_id")), c.left);
+    EXPECT_EQ(Joined(ValuesOf(*document, "//a/v", "v_guess")), c.guesses);
+    EXPECT_THAT(ValuesOf(*document, "//a", "a_manage"), ElementsAre(c.manage));
     std::vector<std::pair<int32_t, std::string>> reported;
     for (const ReportedEvent& event : TakeReportedEvents()) {
-      EXPECT_EQ(event.className, "Filter");
-      EXPECT_EQ(event.kind, 1);
       reported.emplace_back(event.number, event.procedure);
     }
     EXPECT_THAT(reported, ElementsAreArray(std::vector<std::pair<int32_t, std::string>>(

@@ -4,8 +4,10 @@
 
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "frame/error_handler.h"
+#include "frame/highest_id.h"
 #include "support/reported_events.h"
 
 namespace trl {
@@ -60,12 +62,43 @@ TEST_F(AddEventsXmlTest, EventsAreAppendedLastAndTheReporterIsReset) {
 
 TEST_F(AddEventsXmlTest, ResultsWithoutRootReportTheFailureAndStillReset) {
   HandleEvent(6, "Overflow", 1, "trlLocator", "Search", "Search", false, false, "", 0, true);
+  // The failed append is reported before the resets clear it with the rest: seen as it happens.
+  std::vector<std::string> seen;
+  ObserveReports([&](const ReportedEventView& event) {
+    seen.push_back(std::string(event.className) + "." + std::string(event.procedure) + " " +
+                   std::to_string(event.number));
+  });
   xml::Document results;
   EXPECT_TRUE(AddEventsXML(results));
+  ObserveReports(nullptr);
   EXPECT_EQ(results.Xml(), "");
-  // The failed append was reported before the resets, which then cleared it with the rest.
+  EXPECT_EQ(seen, std::vector<std::string>{"basGeneral.AddEventsXML 91"});
   EXPECT_TRUE(testing::TakeReportedEvents().empty());
   EXPECT_EQ(SharedReporter()->Count(1), 0);
+}
+
+TEST_F(AddEventsXmlTest, HighestIdReadsFirstAttributesAndReportsThoseThatAreNoNumber) {
+  struct Case {
+    const char* document;
+    int32_t highest;
+    std::vector<int32_t> failures;
+  } cases[] = {
+      {"<r/>", 0, {}},
+      {"<r><c c_id='3'/><c c_id='9'/><x><c c_id='5'/></x></r>", 9, {}},
+      {"<r><c c_key='7' c_id='2'/></r>", 7, {}},
+      {"<r><c c_id='-5'/></r>", -5, {}},
+      {"<r><c c_text='a' c_id='5'/><c c_id='2'/></r>", 2, {kTypeMismatch}},
+      {"<r><c/><c c_id='4'/><c c_id='x'/></r>", 4, {kObjectNotSet, kTypeMismatch}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.document);
+    xml::Document document;
+    ASSERT_TRUE(document.LoadXml(c.document));
+    EXPECT_EQ(HighestId(OnError{"Merge", "Start"}, document.DocumentElement(), "c"), c.highest);
+    std::vector<int32_t> reported;
+    for (const auto& event : testing::TakeReportedEvents()) reported.push_back(event.number);
+    EXPECT_EQ(reported, c.failures);
+  }
 }
 
 }  // namespace

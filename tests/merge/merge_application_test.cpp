@@ -58,9 +58,7 @@ TEST_P(MergeApplicationTest, CarriesSettingsAndHistory) {
   const Case& c = GetParam();
   auto old = Parse(Results(Place("Host", "C:", "\\App\\", c.oldApplication), c.rootAttributes));
   auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", c.newApplication)));
-  MergeNow(nullptr, nullptr, old, fresh);
-
-  EXPECT_THAT(TakeReportedEvents(), IsEmpty());
+  EXPECT_THAT(MergeNow(Parse("<o/>"), nullptr, old, fresh).events, IsEmpty());
   ASSERT_EQ(old->AsNode().CountNodes("//d/a"), 1u);
   EXPECT_THAT(ValuesOf(*old, "//d/a", "a_name"), ElementsAre("App"));  // the new entry
   EXPECT_THAT(ValuesOf(*old, "//d/a", "a_manage"), ElementsAre(c.manage));
@@ -81,7 +79,7 @@ TEST(MergeHistoryTest, TheAddedEntryIsTheOldFirstVersionStampedNow) {
                     "<a a_id='7' v_id='12'><v v_id='12' v_name='1.2'><f f_id='1'/></v></a>")));
   auto fresh =
       Parse(Results(Place("Host", "C:", "\\App\\", "<a a_id='7' a_name='App' v_id='15'/>")));
-  MergeNow(nullptr, nullptr, old, fresh);
+  MergeNow(Parse("<o/>"), nullptr, old, fresh);
   auto entries = old->AsNode().SelectNodes("//a/v_history/v");
   ASSERT_EQ(entries.size(), 1u);
   auto attributes = entries[0].Attributes();

@@ -4,6 +4,7 @@
 
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "support/documents.h"
 #include "trl/merge.h"
@@ -49,7 +50,7 @@ inline std::string Shape(const xml::Node& node) {
     } else if (tag == "c" || tag == "m" || tag == "d" || tag == "a") {
       text = tag + child.GetAttribute(tag + "_id").value_or("?");
     } else {
-      continue;
+      text = tag;
     }
     if (tag != "a") text += "(" + Shape(child) + ")";
     if (tag == "a" && node.NodeName() == "a_missing")
@@ -59,14 +60,21 @@ inline std::string Shape(const xml::Node& node) {
   return out;
 }
 
-// Merges synchronously; answers the merged results' text.
-inline std::string MergeNow(const xml::DocumentPtr& searchOptions,
-                            const xml::DocumentPtr& applicationOptions,
-                            const xml::DocumentPtr& oldResults,
-                            const xml::DocumentPtr& newResults) {
+// What a synchronous merge answered and reported; the events are taken while the worker lives,
+// since its teardown releases the thread's reporter.
+struct MergeRun {
+  std::string text;
+  std::vector<ReportedEvent> events;
+};
+
+inline MergeRun MergeNow(const xml::DocumentPtr& searchOptions,
+                         const xml::DocumentPtr& applicationOptions,
+                         const xml::DocumentPtr& oldResults, const xml::DocumentPtr& newResults) {
   Merge merge;
   merge.Asynchronous(false);
-  return merge.Start(searchOptions, applicationOptions, oldResults, newResults);
+  MergeRun run{merge.Start(searchOptions, applicationOptions, oldResults, newResults), {}};
+  run.events = TakeReportedEvents();
+  return run;
 }
 
 }  // namespace trl::testing

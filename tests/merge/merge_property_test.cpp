@@ -234,8 +234,8 @@ void CheckRun(uint32_t trial, Seen& seen) {
     before[{std::get<0>(app.place), std::get<1>(app.place), std::get<2>(app.place), app.id}] =
         Content(At(*old, app));
 
-  MergeNow(Parse(SearchOptions(run, g)), Parse(ApplicationOptions(run)), old, fresh);
-  ASSERT_TRUE(TakeReportedEvents().empty());
+  ASSERT_TRUE(MergeNow(Parse(SearchOptions(run, g)), Parse(ApplicationOptions(run)), old, fresh)
+                  .events.empty());
   EXPECT_EQ(fresh->AsNode().CountNodes("//a"), 0u);
 
   std::map<Key, const App*> freshAt;

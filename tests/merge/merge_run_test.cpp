@@ -7,6 +7,7 @@
 
 #include "merge/merge_fixture.h"
 #include "platform/event_loop.h"
+#include "platform/failure.h"
 
 namespace trl::testing {
 namespace {
@@ -32,13 +33,19 @@ const CounterCase kCounterCases[] = {
      Place("A", "C:", "\\X\\", App("1"), "3 4 6") + Place("B", "C:", "\\X\\", App("1"), "9 2 8") +
          Place("C", "C:", "\\X\\", App("1"), "5 7 1"),
      "10 8 9"},
+    {"TheFirstAttributeIsTheIdWhateverItsName",
+     "<c c_no='6' c_text='A' c_name='a'><m m_no='3' m_text='C:' m_name='c:'>"
+     "<d d_no='8' d_text='\\X\\' d_name='\\x\\'/></m></c>",
+     "7 4 9"},
 };
 
 class MergeCounterTest : public ::testing::TestWithParam<CounterCase> {};
 
 TEST_P(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
   auto old = Parse(Results(GetParam().oldBody));
-  MergeNow(nullptr, nullptr, old, Parse(Results(Place("New", "E:", "\\Y\\", App("2")))));
+  auto run =
+      MergeNow(Parse("<o/>"), nullptr, old, Parse(Results(Place("New", "E:", "\\Y\\", App("2")))));
+  for (const ReportedEvent& event : run.events) EXPECT_NE(event.className, "Merge");
   auto c = old->AsNode().SelectSingleNode("//c[@c_name='new']");
   ASSERT_TRUE(c);
   auto m = c.SelectSingleNode("m");
@@ -123,6 +130,17 @@ TEST_F(MergeRunTest, ProgressCarriesTheApplicationNameBeforeTheCounters) {
   RunToEnd(nullptr, Parse(Results("")), fresh);
   EXPECT_THAT(names, ElementsAre("e_mode", "e_status", "a_name", "e_match_total_new",
                                  "e_match_total_old", "e_match_merged", "e_match_missing"));
+}
+
+TEST_F(MergeRunTest, TheNameIsReadOnlyForTheProgressOfAnAsynchronousRun) {
+  const std::string nameless = Place("Host", "C:", "\\App\\", "<a a_id='8' v_id='1'/>");
+  EXPECT_THAT(MergeNow(Parse("<o/>"), nullptr, Parse(Results("")), Parse(Results(nameless))).events,
+              IsEmpty());
+  RunToEnd(Parse("<o/>"), Parse(Results("")), Parse(Results(nameless)));
+  auto events = TakeReportedEvents();
+  ASSERT_EQ(events.size(), 1u);
+  EXPECT_EQ(events[0].number, kInvalidUseOfNull);
+  EXPECT_EQ(events[0].procedure, "Merge");
 }
 
 TEST_F(MergeRunTest, CancelCompletesTheApplicationInProgressAndLeavesTheRest) {

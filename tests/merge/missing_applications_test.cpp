@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "merge/merge_fixture.h"
+#include "platform/failure.h"
 
 namespace trl::testing {
 namespace {
@@ -22,6 +23,7 @@ struct Case {
   std::string newResults;
   const char* applicationOptions;
   const char* shape;  // of the old results afterwards
+  std::vector<ReportedEvent> failures = {};
 };
 
 const std::string kHostC = Place("Host", "C:", "\\App\\", App("7"));
@@ -73,6 +75,16 @@ const Case kCases[] = {
     {"ANameWithAnApostropheIsTakenAsTheSelectionReadsIt",
      Managed("nope&apos; or @c_name=&apos;host", "c:", "\\app\\", "7"), kHostC, "", "",
      "missing(7)"},
+    {"DuplicateIdsInAFolderMoveTheFirstOnly", Managed("host", "c:", "\\app\\", "7"),
+     Place("Host", "C:", "\\App\\", App("7") + App("7")), "", "", "c1(m1(d1(a7))) missing(7)"},
+    // The computer cannot be taken from the root, which does not hold it: the drive still goes.
+    {"EachEmptiedLevelIsRemovedOnItsOwn",
+     Managed("host", "c:", "\\app\\", "7"),
+     "<x>" + kHostC + "</x>",
+     "",
+     "",
+     "x(c1()) missing(7)",
+     {{kInvalidArgument, 1, "Merge", "MissingApplication", "", ""}}},
     {"SecondMissingJoinsTheList",
      Managed("host", "c:", "\\app\\", "7") + Managed("host", "c:", "\\app\\", "8"),
      kTwoApps + "<a_missing><a a_id='3'/></a_missing>", "", "", "missing(3 7 8)"},
@@ -85,10 +97,15 @@ class MissingApplicationsTest : public ::testing::TestWithParam<Case> {};
 TEST_P(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
   const Case& c = GetParam();
   auto old = Parse(Results(c.oldResults));
-  MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
-           Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
-           Parse(Results(c.newResults)));
-  EXPECT_THAT(TakeReportedEvents(), IsEmpty());
+  auto run = MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
+                      Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
+                      Parse(Results(c.newResults)));
+  std::vector<ReportedEvent> failures;
+  for (ReportedEvent event : run.events) {
+    event.description = event.source = "";
+    failures.push_back(event);
+  }
+  EXPECT_EQ(failures, c.failures);
   EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
   for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
     EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
