@@ -40,6 +40,10 @@ class Locate : public Worker {
   // Search and Compare work on these file systems (other share mappings, or a test's file system).
   Locate(std::unique_ptr<fs::FileSystem> searchFileSystem,
          std::unique_ptr<fs::FileSystem> compareFileSystem);
+  // Runs these stage workers (configured by the caller); a missing one is reported as one that
+  // could not be created.
+  Locate(std::unique_ptr<Search> search, std::unique_ptr<Compare> compare,
+         std::unique_ptr<Filter> filter, std::unique_ptr<Merge> merge);
   ~Locate() override;
 
   int16_t Mode() const { return stageMode_; }

@@ -27,17 +27,19 @@ Locate::Locate() : Locate(nullptr, nullptr) {}
 
 Locate::Locate(std::unique_ptr<fs::FileSystem> searchFileSystem,
                std::unique_ptr<fs::FileSystem> compareFileSystem)
+    : Locate(searchFileSystem ? std::make_unique<Search>(std::move(searchFileSystem))
+                              : std::make_unique<Search>(),
+             compareFileSystem ? std::make_unique<Compare>(std::move(compareFileSystem))
+                               : std::make_unique<Compare>(),
+             std::make_unique<Filter>(), std::make_unique<Merge>()) {}
+
+Locate::Locate(std::unique_ptr<Search> search, std::unique_ptr<Compare> compare,
+               std::unique_ptr<Filter> filter, std::unique_ptr<Merge> merge)
     : Worker(kClass, kLocateMode) {
-  trlSearch = CreateService<Search>("trlLocator.Search", [&] {
-    return searchFileSystem ? std::make_unique<Search>(std::move(searchFileSystem))
-                            : std::make_unique<Search>();
-  });
-  trlCompare = CreateService<Compare>("trlLocator.Compare", [&] {
-    return compareFileSystem ? std::make_unique<Compare>(std::move(compareFileSystem))
-                             : std::make_unique<Compare>();
-  });
-  trlFilter = CreateService<Filter>("trlLocator.Filter", [] { return std::make_unique<Filter>(); });
-  trlMerge = CreateService<Merge>("trlLocator.Merge", [] { return std::make_unique<Merge>(); });
+  trlSearch = CreateService<Search>("trlLocator.Search", [&] { return std::move(search); });
+  trlCompare = CreateService<Compare>("trlLocator.Compare", [&] { return std::move(compare); });
+  trlFilter = CreateService<Filter>("trlLocator.Filter", [&] { return std::move(filter); });
+  trlMerge = CreateService<Merge>("trlLocator.Merge", [&] { return std::move(merge); });
 
   stages_[0] = std::make_unique<Stage>(locate::kSearchStage, trlSearch.get(), &searchResults_);
   stages_[1] = std::make_unique<Stage>(locate::kCompareStage, trlCompare.get(), &compareResults_);

@@ -14,10 +14,15 @@
 
 #include "frame/error_handler.h"
 #include "platform/event_loop.h"
+#include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "support/documents.h"
 #include "support/reported_events.h"
 #include "support/temp_tree.h"
+#include "trl/compare.h"
+#include "trl/filter.h"
+#include "trl/merge.h"
+#include "trl/search.h"
 
 namespace trl::testing {
 namespace {
@@ -172,17 +177,127 @@ TEST_F(LocateTest, StageReportsAreRelayedInOrderAndEachStagesEventsGathered) {
     lists.push_back(list.NodeName());
   }
   EXPECT_THAT(lists, ElementsAre("search", "compare", "filter", "merge"));
-  // Events stay with the stage that recorded them: the merge has none of the search's.
-  EXPECT_EQ(results->AsNode().SelectNodes("//events/merge/event").size(), 0u);
 }
 
-TEST_F(LocateTest, RunLogHoldsEveryStepInOrder) {
+// "<list>:<number>" for each event gathered in the last events element of the results.
+std::vector<std::string> Gathered(const std::string& results) {
+  std::vector<std::string> gathered;
+  auto document = Parse(results);
+  for (const xml::Node& e : document->AsNode().SelectNodes("/*/events[last()]/*/event")) {
+    gathered.push_back(e.ParentNode().NodeName() + ":" + e.GetAttribute("number").value_or("?"));
+  }
+  return gathered;
+}
+
+TEST_F(LocateTest, EachStagesEventsAreGatheredFromItsOwnResults) {
+  // The search misses a folder, the compare meets a property kind it does not know, the filter
+  // passes on the matches with the compare's events, and the merge's results are the user data.
+  std::string missing =
+      R"(<d d_id="2" d_text=")" + tree_.Path("Gone") + R"(" d_search="1"><d_search_mask/></d>)";
+  auto fingerprint = Fingerprint();
+  fingerprint->AsNode().SelectSingleNode("//f").AppendChild(
+      Parse(R"(<p p_type="5" p_weight="1" p_value="x"/>)")->DocumentElement());
+  auto userData = Parse(R"(<trl_applicationdata><events><merge><event number="7"/></merge>)"
+                        R"(</events></trl_applicationdata>)");
+  auto locate = NewLocate(true);
+  bool ended = false;
+  locate->OnStatusUpdate([&](const std::string& update, const std::string& results) {
+    if (ReadReport(update).mode == Locate::kFinished) {
+      lastResults_ = results;
+      ended = true;
+    }
+  });
+  locate->Start(Parse(SearchOptions(missing)), nullptr, kAllRules, fingerprint, userData);
+  ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return ended; }, std::chrono::seconds(20)));
+  const std::string notFound = std::to_string(kObjectErrorBase + 20201);
+  const std::string unknownKind = std::to_string(kObjectErrorBase + 20203);
+  EXPECT_THAT(Gathered(lastResults_), ElementsAre("search:" + notFound, "compare:" + unknownKind,
+                                                  "filter:" + unknownKind, "merge:7"));
+}
+
+// A Search that raises one report of its own before its run, and may answer results that are not
+// XML: what a faulty stage would send.
+class FaultySearch : public Search {
+ public:
+  FaultySearch(std::string update, std::string results)
+      : Search(fs::CreatePosixFileSystem({})),
+        update_(std::move(update)),
+        results_(std::move(results)) {}
+
+ protected:
+  void RunBody() override {
+    if (!update_.empty()) RaiseStatusUpdate(update_, Search::ResultsXml());
+    Search::RunBody();
+  }
+  std::string ResultsXml() override { return results_.empty() ? Search::ResultsXml() : results_; }
+
+ private:
+  std::string update_, results_;
+};
+
+TEST_F(LocateTest, AFaultyStageReportIsRelayedAndTheRunGoesOn) {
+  struct Case {
+    const char *update, *results;
+    int16_t status;        // Locate's status as the client sees the faulty report
+    const char* gathered;  // the list and number of each event the fault gave
+  } cases[] = {
+      {R"(<e e_mode="1" e_status="x"/>)", "", 1, "search:13"},
+      {R"(<e e_mode="1"/>)", "", 1, "search:94"},
+      {"not XML", "", 0, "search:91"},
+      // The unloadable list and the selection in it, then the compare of a search that is empty.
+      {"", "not XML", -1,
+       "compare:-2147220991 compare:91 compare:91 filter:-2147220991 filter:91 filter:91"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(std::string(c.update) + c.results);
+    Locate locate(std::make_unique<FaultySearch>(c.update, c.results),
+                  std::make_unique<Compare>(fs::CreatePosixFileSystem({})),
+                  std::make_unique<Filter>(), std::make_unique<Merge>());
+    std::vector<int16_t> statuses;
+    bool ended = false;
+    locate.OnStatusUpdate([&](const std::string& update, const std::string& results) {
+      statuses.push_back(locate.Status());
+      auto document = std::make_shared<xml::Document>();
+      if (document->LoadXml(update) && document->DocumentElement().GetAttribute("e_mode") == "5") {
+        lastResults_ = results;
+        ended = true;
+      }
+    });
+    locate.Start(Parse(SearchOptions()), nullptr, kAllRules, Fingerprint(), nullptr);
+    ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return ended; }, std::chrono::seconds(20)));
+    if (c.status >= 0) EXPECT_EQ(statuses.at(2), c.status);
+    EXPECT_EQ(Gathered(lastResults_), Words(c.gathered));
+    EXPECT_EQ(locate.Status(), kStatusComplete);
+  }
+}
+
+TEST_F(LocateTest, AClientMayFollowProgressFromAnyReportAndCannotStartAgainMidRun) {
+  auto locate = NewLocate(true);
+  std::set<int> progressModes;
+  std::string again = "not called";
+  RunAsync(*locate, SearchOptions(), nullptr, [&](const Report& report) {
+    if (report.mode == 0) {
+      locate->OnProgressUpdate(
+          [&](const std::string& update) { progressModes.insert(ReadReport(update).mode); });
+    }
+    if (report.mode == 2 && report.status == 2) {
+      again = locate->Start(Parse(SearchOptions()), nullptr, kAllRules, Fingerprint(), nullptr);
+    }
+  });
+  EXPECT_THAT(progressModes, ElementsAre(1, 2, 3, 4));
+  EXPECT_EQ(again, "");
+  EXPECT_EQ(locate->Mode(), Locate::kFinished);
+  EXPECT_THAT(ValuesOf(*Parse(lastResults_), "//d/a", "a_name"), ElementsAre("Alpha", "Beta"));
+}
+
+TEST_F(LocateTest, RunLogHoldsEveryStepInOrderRunAfterRun) {
+  std::string log = tree_.Native("run.log");
+  auto locate = NewLocate(false);
+  locate->LogFile(log);
+  size_t before = 0;
   for (bool asynchronous : {false, true}) {
     SCOPED_TRACE(asynchronous ? "asynchronous" : "synchronous");
-    std::string log = tree_.Native("run.log");
-    std::filesystem::remove(log);
-    auto locate = NewLocate(asynchronous);
-    locate->LogFile(log);
+    locate->Asynchronous(asynchronous);
     if (asynchronous) {
       RunAsync(*locate, SearchOptions(), nullptr);
     } else {
@@ -206,7 +321,9 @@ TEST_F(LocateTest, RunLogHoldsEveryStepInOrder) {
     expected.emplace_back("Locate.Finalise", "Locate process complete");
 
     auto entries = LogEntries(log);
-    ASSERT_FALSE(entries.empty());
+    ASSERT_GT(entries.size(), before);
+    entries.erase(entries.begin(), entries.begin() + before);  // the run before stays
+    before += entries.size();
     EXPECT_EQ(entries.front().first, "Locate.Start");
     EXPECT_THAT(entries.front().second,
                 StartsWith(std::string("<options  asynchronous=\"") + (asynchronous ? "1" : "0") +
@@ -214,6 +331,11 @@ TEST_F(LocateTest, RunLogHoldsEveryStepInOrder) {
     entries.erase(entries.begin());
     EXPECT_THAT(entries, ElementsAreArray(expected));
   }
+  // Without a log file nothing is written, not even to the file the run before named.
+  locate->LogFile("");
+  locate->Asynchronous(false);
+  locate->Start(Parse(SearchOptions()), nullptr, kAllRules, Fingerprint());
+  EXPECT_EQ(LogEntries(log).size(), before);
 }
 
 TEST_F(LocateTest, SecondRunRecordsTheUpgradeAndTheManagedApplicationThatWentMissing) {
