@@ -10,6 +10,8 @@
 
 namespace trl::cli {
 
+using AddCommand = std::function<std::function<int()>(CLI::App&)>;
+
 inline std::string ReadFile(const std::string& path) {
   std::ifstream in(path, std::ios::binary);
   std::stringstream text;
@@ -18,8 +20,8 @@ inline std::string ReadFile(const std::string& path) {
 }
 
 // Runs the subcommand `name` that `add` puts on a command line, with `args`; answers the exit code.
-inline int RunCommand(const std::function<std::function<int()>(CLI::App&)>& add,
-                      const std::string& name, std::vector<std::string> args) {
+inline int RunCommand(const AddCommand& add, const std::string& name,
+                      std::vector<std::string> args) {
   CLI::App app;
   auto run = add(app);
   args.insert(args.begin(), name);

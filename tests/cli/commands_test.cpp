@@ -1,0 +1,192 @@
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "command_error.h"
+#include "command_test_support.h"
+#include "compare_command.h"
+#include "filter_command.h"
+#include "filter_names.h"
+#include "fingerprint_command.h"
+#include "frame/error_handler.h"
+#include "locate_command.h"
+#include "merge_command.h"
+#include "search_command.h"
+#include "support/documents.h"
+#include "support/temp_tree.h"
+#include "trl/xml.h"
+
+namespace trl::cli {
+namespace {
+
+// A tree with inputs for each command. Command lines name its files as "@name".
+class CommandsTest : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    tree_.AddFolder("App");
+    tree_.AddFile("App/Main.exe", "x");
+    tree_.AddFile("search.xml",
+                  "<o><c c_id='1' c_text='localhost' c_name='localhost' c_local='1'>"
+                  "<m m_id='1' m_text='' m_name=''><d d_id='1' d_text='" +
+                      tree_.Path("App") +
+                      "' d_search='1'><d_search_mask/></d><d d_id='2' d_text='" +
+                      tree_.Path("Gone") + "' d_search='1'><d_search_mask/></d></m></c></o>");
+    tree_.AddFolder("share/Tool");
+    tree_.AddFile("share/Tool/tool.exe", "x");
+    tree_.AddFile("local.xml",
+                  "<trl_applicationdata><c c_text='server' c_name='server'><m m_text='apps' "
+                  "m_name='apps'><d d_text='\\Tool\\' d_name='\\tool\\'><f f_text='Tool.exe' "
+                  "f_name='tool.exe'/></d></m></c></trl_applicationdata>");
+    tree_.AddFile("fingerprint.xml",
+                  "<fp><a a_id='1'><v v_id='1' v_seq='1'><f f_id='1' "
+                  "f_name='tool.exe' f_relpath='' f_weight='1'><p p_type='2' "
+                  "p_weight='1' p_value='1'/></f></v></a></fp>");
+    tree_.AddFile("matches.xml",
+                  "<trl_applicationdata><c><m><d><a a_id='1'>"
+                  "<v v_id='1' v_name='One' v_seq='1' v_max='3' v_act='3' f_max='2' f_act='1'/>"
+                  "<v v_id='2' v_name='Two' v_seq='2' v_max='3' v_act='1' f_max='2' f_act='2'/>"
+                  "</a></d></m></c></trl_applicationdata>");
+    const std::string place =
+        "<trl_applicationdata><c c_id='1' c_text='Host' c_name='host'><m m_id='1' m_text='C:' "
+        "m_name='c:'><d d_id='1' d_text='\\App\\' d_name='\\app\\'>";
+    tree_.AddFile("managed.xml",
+                  "<o><c c_name='host'><m m_name='c:'><d d_name='\\app\\'><a a_id='8' "
+                  "a_manage='1'/></d></m></c></o>");
+    tree_.AddFile("user.xml", place +
+                                  "<a a_id='7' a_manage='0' v_id='1'><v v_id='1'/></a>"
+                                  "<a a_id='8' a_name='Gone' v_id='1'/></d></m></c>"
+                                  "</trl_applicationdata>");
+    tree_.AddFile("new.xml", place +
+                                 "<a a_id='7' a_name='Kept' v_id='2'><v v_id='2'/></a></d></m></c>"
+                                 "</trl_applicationdata>");
+  }
+  void TearDown() override { ReleaseSharedReporter(); }
+
+  // `text` with each "@name" replaced by the native path of `name` in the tree.
+  std::string Expand(std::string text) const {
+    for (size_t at = text.find('@'); at != std::string::npos; at = text.find('@', at)) {
+      size_t end = std::min(text.find_first_of(" ':", at), text.size());
+      std::string path = tree_.Native(text.substr(at + 1, end - at - 1));
+      text.replace(at, end - at, path);
+      at += path.size();
+    }
+    return text;
+  }
+
+  // Runs a command line; answers the exit code and the message of the error that ended it.
+  std::pair<int, std::string> Run(const std::string& line) const {
+    static const std::map<std::string, AddCommand> kCommands{
+        {"search", AddSearchCommand}, {"compare", AddCompareCommand},
+        {"filter", AddFilterCommand}, {"merge", AddMergeCommand},
+        {"locate", AddLocateCommand}, {"fingerprint", AddFingerprintCommand}};
+    std::vector<std::string> args = testing::Words(Expand(line));
+    try {
+      return {RunCommand(kCommands.at(args[0]), args[0], {args.begin() + 1, args.end()}), ""};
+    } catch (const CommandError& error) {
+      return {error.ExitCode(), error.what()};
+    } catch (const CLI::ParseError& error) {
+      return {kExitBadInput, error.what()};
+    }
+  }
+
+  testing::TempTree tree_;
+};
+
+TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageReports) {
+  struct Case {
+    std::string line;
+    std::string printed;
+    std::string selects;  // exactly one node of the output
+  } cases[] = {
+      {"search --search-options @search.xml",
+       "trllocator: warning: Path '" + tree_.Path("Gone") + "\\' could not be found\n",
+       "/*/c/m/d/f[@f_text='Main.exe']"},
+      {"compare --local-files @local.xml --fingerprint @fingerprint.xml --share "
+       "\\\\server\\apps=@share",
+       "", "/trl_applicationdata/c/m/d/a/v[@v_act='1']"},
+      {"filter --filter low-weights,flag-unmanaged --matches @matches.xml", "",
+       "/trl_applicationdata/c/m/d/a[@v_name='One'][@a_manage='0'][count(v)=1]"},
+      {"merge --search-options @managed.xml --user-data @user.xml --new-results @new.xml", "",
+       "/trl_applicationdata[a_missing/a[@a_id='8']]/c/m/d/a[@a_id='7'][@a_manage='0']/v_history/"
+       "v[@v_id='1']"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.line);
+    ::testing::internal::CaptureStderr();
+    EXPECT_EQ(Run(c.line + " --output @out.xml"), std::make_pair(kExitOk, std::string()));
+    EXPECT_EQ(::testing::internal::GetCapturedStderr(), c.printed);
+    xml::Document out;
+    ASSERT_TRUE(out.LoadXml(ReadFile(tree_.Native("out.xml"))));
+    EXPECT_EQ(out.AsNode().CountNodes(c.selects), 1u);
+    std::filesystem::remove(tree_.Native("out.xml"));
+  }
+}
+
+TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
+  tree_.AddFile("broken.xml", "<a>\n  <b></a>");
+  const std::string add = "fingerprint add --app-id 1 --version-name v --seq 1 --folder ";
+  struct Case {
+    std::string line;
+    int exitCode;
+    std::string message;  // how it begins
+  } cases[] = {
+      {"search --search-options @missing.xml", kExitBadInput,
+       "cannot read the search options '@missing.xml': No such file or directory"},
+      {"search --search-options @search.xml/x.xml", kExitBadInput,
+       "cannot read the search options '@search.xml/x.xml': Not a directory"},
+      {"search --search-options @", kExitBadInput,
+       "cannot read the search options '@': Is a directory"},
+      {"search --search-options @broken.xml", kExitBadInput,
+       "the search options '@broken.xml' is not well-formed XML: line 2, column"},
+      {"search --search-options @search.xml --share host=dir --output @out.xml", kExitBadInput,
+       "--share 'host=dir' is not a share mapping"},
+      {"search --search-options @search.xml --output /nonexistent/out.xml", kExitFailed,
+       "cannot write '/nonexistent/out.xml': No such file or directory"},
+      {"compare --local-files @local.xml --fingerprint @none.xml", kExitBadInput,
+       "cannot read the fingerprint database '@none.xml'"},
+      {"merge --search-options @managed.xml --user-data @user.xml --new-results @none.xml",
+       kExitBadInput, "cannot read the new results '@none.xml'"},
+      {"filter --filter 64 --matches @matches.xml", kExitBadInput, "--filter '64' is not a filter"},
+      {"locate --search-options @search.xml --save --output @out.xml", kExitBadInput,
+       "--save needs the user data"},
+      {"locate --search-options @search.xml --filter low-weights,bogus --output @out.xml",
+       kExitBadInput, "--filter 'low-weights,bogus'"},
+      {add + "@App --version-id 1 --database @fingerprint.xml", kExitBadInput,
+       "application 1 already has a version 1"},
+      {add + "@App --version-id 2 --database @broken.xml", kExitBadInput,
+       "the fingerprint database '@broken.xml' is not well-formed XML"},
+      {add + "@App --version-id -2 --database @db.xml", kExitBadInput,
+       "--version-id: '-2' is not a"},
+      {add + "@none --version-id 2 --database @db.xml", kExitBadInput,
+       "the folder '@none' does not exist"},
+  };
+  ::testing::internal::CaptureStderr();
+  for (const Case& c : cases) {
+    auto [code, message] = Run(c.line);
+    EXPECT_EQ(code, c.exitCode) << c.line;
+    EXPECT_EQ(message.substr(0, Expand(c.message).size()), Expand(c.message));
+  }
+  ::testing::internal::GetCapturedStderr();
+  EXPECT_FALSE(std::filesystem::exists(tree_.Native("out.xml")));
+  EXPECT_FALSE(std::filesystem::exists(tree_.Native("db.xml")));
+}
+
+TEST(FilterNamesTest, NumbersAndNamesGiveTheOptionBitsAndAnythingElseIsRefused) {
+  const std::pair<const char*, int16_t> accepted[] = {
+      {"63", 63},
+      {"007", 7},
+      {"missing-files,low-file-count,duplicate-matches,flag-unknowns", 30},
+      {"low-weights,low-weights", 1},
+      {"all", 63}};
+  for (auto [text, options] : accepted) EXPECT_EQ(ParseFilterOptions(text), options) << text;
+  for (const char* text :
+       {"", "64", "-1", "3x", "Low-Weights", "low-weights,", ",all", "99999999999999999999"}) {
+    EXPECT_THROW(ParseFilterOptions(text), CommandError) << text;
+  }
+}
+
+}  // namespace
+}  // namespace trl::cli

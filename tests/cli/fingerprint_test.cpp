@@ -1,0 +1,147 @@
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "command_error.h"
+#include "command_test_support.h"
+#include "fingerprint_author.h"
+#include "fingerprint_command.h"
+#include "platform/fs/posix/posix_file_system.h"
+#include "support/documents.h"
+#include "support/temp_tree.h"
+
+namespace trl::cli {
+namespace {
+
+using testing::Parse;
+using testing::ValuesOf;
+using Strings = std::vector<std::string>;
+
+class FingerprintAuthorTest : public ::testing::Test {
+ protected:
+  ReferenceVersion Version(std::string appId, std::string versionId) const {
+    return {.folder = tree_.Path("app"),
+            .appId = appId,
+            .appName = "Tool",
+            .parentId = std::nullopt,
+            .versionId = versionId,
+            .versionName = "1.0",
+            .seq = "3"};
+  }
+  xml::Node Add(xml::Document& database, const ReferenceVersion& version) {
+    return AddReferenceVersion(database, version, *fileSystem_);
+  }
+
+  testing::TempTree tree_;
+  std::unique_ptr<fs::FileSystem> fileSystem_ = fs::CreatePosixFileSystem({});
+};
+
+// Contents are RFC 1321 test inputs, so the expected digests are the published ones.
+TEST_F(FingerprintAuthorTest, DescribesEveryFileWithItsFolderWeightSizeAndDigest) {
+  struct Case {
+    const char* path;  // below the installation
+    const char* content;
+    const char* relpath;
+    const char* weight;  // 2 for documentation, 3 for the rest
+    const char* md5;
+  };
+  // In the expected order: a folder's files by name (byte order), then its subfolders.
+  const std::vector<Case> cases = {
+      {"ChangeLog", "abc", "", "2", "900150983cd24fb0d6963f7d28e17f72"},
+      {"README", "", "", "2", "d41d8cd98f00b204e9800998ecf8427e"},
+      {"md", "a", "", "3", "0cc175b9c0f1b6a831c399e269772661"},
+      {"my-readme", "abc", "", "3", "900150983cd24fb0d6963f7d28e17f72"},
+      {"tool", "", "", "3", "d41d8cd98f00b204e9800998ecf8427e"},
+      {"lib/License-MIT", "a", "lib", "2", "0cc175b9c0f1b6a831c399e269772661"},
+      {"lib/main.js", "message digest", "lib", "3", "f96b697d7cb7938d525a2f31aaf161d0"},
+      {"lib/sub/.hidden", "abc", "lib\\sub", "3", "900150983cd24fb0d6963f7d28e17f72"},
+      {"lib/sub/notes.MD", "", "lib\\sub", "2", "d41d8cd98f00b204e9800998ecf8427e"},
+  };
+  tree_.AddFolder("app/lib/sub");
+  tree_.AddFolder("app/empty");
+  for (auto it = cases.rbegin(); it != cases.rend(); ++it) {
+    tree_.AddFile(std::string("app/") + it->path, it->content);
+  }
+  ReferenceVersion version = Version("1", "10");
+  version.docWeight = 2;
+  version.fileWeight = 3;
+  xml::Document database;
+  Add(database, version);
+
+  std::vector<xml::Node> files = database.AsNode().SelectNodes("/trl_fingerprint/a/v/f");
+  ASSERT_EQ(files.size(), cases.size());
+  for (size_t i = 0; i < cases.size(); ++i) {
+    const Case& c = cases[i];
+    std::string name = std::string(c.path).substr(std::string(c.path).rfind('/') + 1);
+    EXPECT_EQ(files[i].Xml(), "<f f_id=\"" + std::to_string(i + 1) + "\" f_name=\"" + name +
+                                  "\" f_relpath=\"" + c.relpath + "\" f_weight=\"" + c.weight +
+                                  "\"><p p_type=\"2\" p_weight=\"1\" p_value=\"" +
+                                  std::to_string(std::string(c.content).size()) +
+                                  "\"/><p p_type=\"3\" p_weight=\"2\" p_value=\"" + c.md5 +
+                                  "\"/></f>")
+        << c.path;
+  }
+  EXPECT_EQ(ValuesOf(database, "/trl_fingerprint/a", "a_name"), Strings{"Tool"});
+  EXPECT_EQ(database.DocumentElement().SelectSingleNode("a/v").Attributes(),
+            (std::vector<std::pair<std::string, std::string>>{
+                {"v_id", "10"}, {"v_name", "1.0"}, {"v_seq", "3"}}));
+}
+
+TEST_F(FingerprintAuthorTest, VersionsGoToTheApplicationWithTheSameIdAndATakenIdNeedsReplace) {
+  tree_.AddFolder("app");
+  tree_.AddFile("app/tool", "new");
+  const std::string before = R"(<db><a a_id="1" a_name="Other"/><a a_id="7" a_name="Old name">)"
+                             R"(<v v_id="1"/><v v_id="2" v_name="old"/><v v_id="3"/></a></db>)";
+  auto database = Parse(before);
+  EXPECT_THROW(Add(*database, Version("7", "2")), CommandError);
+  EXPECT_EQ(database->Xml(), before);
+
+  ReferenceVersion again = Version("7", "2");
+  again.replace = true;
+  Add(*database, again);
+  ReferenceVersion added = Version("7", "4");
+  added.parentId = "1";
+  Add(*database, added);
+  ReferenceVersion another = Version("8", "1");
+  another.parentId = "7";
+  another.appName.reset();
+  EXPECT_THROW(Add(*database, another), CommandError);  // a new application needs its name
+  another.appName = "Tool";
+  Add(*database, another);
+
+  EXPECT_EQ(ValuesOf(*database, "/db/a", "a_name"), (Strings{"Other", "Old name", "Tool"}));
+  EXPECT_EQ(ValuesOf(*database, "/db/a", "a_parent"), (Strings{"<absent>", "<absent>", "7"}));
+  EXPECT_EQ(ValuesOf(*database, "/db/a[@a_id='7']/v", "v_id"), (Strings{"1", "2", "3", "4"}));
+  EXPECT_EQ(ValuesOf(*database, "/db/a/v[@v_id='2']/f/p[@p_type='2']", "p_value"), Strings{"3"});
+}
+
+TEST(FingerprintCommandTest, CreatesThenRewritesTheDatabase) {
+  testing::TempTree tree;
+  tree.AddFolder("one/bin");
+  tree.AddFile("one/bin/tool", "1");
+  tree.AddFile("one/bin/README.md", "1");
+  tree.AddFolder("db");
+  const std::string database = tree.Native("db/fingerprint.xml");
+  auto add = [&](std::string id) {
+    return RunCommand(AddFingerprintCommand, "fingerprint",
+                      testing::Words("add --app-id 4 --app-name Tool --seq 1 --version-id " + id +
+                                     " --version-name v" + id + " --folder " + tree.Native("one") +
+                                     " --database " + database));
+  };
+  EXPECT_EQ(add("1"), kExitOk);
+  ::testing::internal::CaptureStdout();
+  EXPECT_EQ(add("2"), kExitOk);
+  EXPECT_EQ(::testing::internal::GetCapturedStdout(),
+            database + ": application 4, version 2 (v2): 2 files\n");
+  auto written = Parse(ReadFile(database));
+  EXPECT_EQ(ValuesOf(*written, "/trl_fingerprint/a/v", "v_id"), (Strings{"1", "2"}));
+  EXPECT_EQ(ValuesOf(*written, "//f", "f_relpath"), (Strings{"bin", "bin", "bin", "bin"}));
+  EXPECT_EQ(ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
+  // Neither a backup nor a temporary file is left beside the database.
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree.Native("db")), {}), 1);
+}
+
+}  // namespace
+}  // namespace trl::cli
