@@ -74,7 +74,11 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
   filesSeen_.clear();
 }
 
-void Compare::RunBody() { Match(); }
+void Compare::RunBody() {
+  // Each run sees the disk as it is now, not as an earlier run of this instance found it.
+  if (objFSO) objFSO->Forget();
+  Match();
+}
 
 void Compare::Match() {
   OnError on{kClass, compare::kMatchLabel};

@@ -95,6 +95,8 @@ void Search::SetCountersFrom(xml::Node root) {
 
 void Search::RunBody() {
   OnError on{kClass, kRunLabel};
+  // Each run sees the disk as it is now, not as an earlier run of this instance found it.
+  if (objFSO) objFSO->Forget();
   BeginRun(on);
   if (status_ != kStatusCancelled) WalkSearchOptions();
   Finish();

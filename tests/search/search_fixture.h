@@ -2,87 +2,63 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <memory>
+#include <set>
 #include <string>
-#include <string_view>
-#include <vector>
 
-#include "frame/error_handler.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "support/documents.h"
-#include "support/reported_events.h"
 #include "support/temp_tree.h"
 #include "trl/search.h"
-#include "trl/xml.h"
 
 namespace trl::testing {
 
-// A folder entry of the search options, walked by default. Paths here need no escapes.
-inline std::string Entry(int id, std::string_view folder,
-                         std::string_view attributes = R"(d_search="1")",
-                         std::string_view inner = "<d_search_mask/>") {
-  return "<d d_id=\"" + std::to_string(id) + "\" d_text=\"" + std::string(folder) + "\" " +
-         std::string(attributes) + ">" + std::string(inner) + "</d>";
+// A computer of the search options with one drive and one folder entry; "localhost" is the local
+// one. Ids do not matter to a search, and paths here need no escapes.
+inline std::string Computer(std::string name, std::string drive, std::string folder,
+                            std::string attributes = "d_search='1'",
+                            std::string inner = "<d_search_mask/>") {
+  return "<c c_id='1' c_text='" + name + "' c_name='" + name + "' c_local='" +
+         (name == "localhost" ? "1" : "0") + "'><m m_id='1' m_text='" + drive + "' m_name='" +
+         drive + "'><d d_id='1' d_text='" + folder + "' " + attributes + ">" + inner +
+         "</d></m></c>";
 }
 
-// A computer of the search options with one drive holding `entries`.
-inline std::string Computer(int id, std::string_view name, std::string_view drive,
-                            std::string_view entries) {
-  std::string n = std::to_string(id);
-  bool local = name == "localhost";
-  return "<c c_id=\"" + n + "\" c_text=\"" + std::string(name) + "\" c_name=\"" +
-         std::string(name) + "\" c_local=\"" + (local ? "1" : "0") + "\"><m m_id=\"" + n +
-         "\" m_text=\"" + std::string(drive) + "\" m_name=\"" + std::string(drive) +
-         "\" m_type=\"3\">" + std::string(entries) + "</m></c>";
+inline std::string LocalOptions(std::string folder, std::string attributes = "d_search='1'",
+                                std::string inner = "<d_search_mask/>") {
+  return "<o>" + Computer("localhost", "", folder, attributes, inner) + "</o>";
 }
 
-// Search options with one folder entry on this machine's root drive.
-inline std::string LocalOptions(std::string_view folder,
-                                std::string_view attributes = R"(d_search="1")",
-                                std::string_view inner = "<d_search_mask/>") {
-  return "<trl_searchoptions>" + Computer(1, "localhost", "", Entry(1, folder, attributes, inner)) +
-         "</trl_searchoptions>";
-}
-
-// The document without the run's times, which no expectation can know.
-inline std::string Untimed(xml::Document& document) {
-  xml::Node root = document.DocumentElement();
-  root.RemoveAttribute("search_start");
-  root.RemoveAttribute("search_end");
-  return document.Xml();
-}
-
-// The d_text values below `root`: "\" for `root` itself, "\sub\" for a subfolder.
-inline std::vector<std::string> FoldersBelow(xml::Document& results, std::string_view root) {
-  std::vector<std::string> folders = ValuesOf(results, "//d", "d_text");
-  for (std::string& folder : folders) {
-    if (folder.starts_with(root)) folder.erase(0, root.size());
+// A document in short: each folder as its text below `below` (in any letter case) and the names
+// of its files (each with "#" and the type of each property) and applications, folders and names
+// in byte order; then the number of each event.
+inline std::string Summary(xml::Document& document, const std::string& below) {
+  std::set<std::string> folders;
+  for (const xml::Node& d : document.AsNode().SelectNodes("//d")) {
+    std::string text = d.GetAttribute("d_text").value_or("");
+    if (Lower(text).starts_with(Lower(below))) text.erase(0, below.size());
+    std::set<std::string> items;
+    for (const xml::Node& item : d.SelectNodes("./f|./a")) {
+      std::string name = item.GetAttribute("f_text").value_or(*item.GetAttribute("a_name"));
+      for (const xml::Node& p : item.SelectNodes("./p")) name += "#" + *p.GetAttribute("p_type");
+      items.insert(name);
+    }
+    for (const std::string& item : items) text += " " + item;
+    folders.insert(text);
   }
-  return folders;
+  std::string summary;
+  for (const std::string& folder : folders) summary += "|" + folder;
+  for (const ReportedEvent& e : EventsIn(document)) summary += "|" + std::to_string(e.number);
+  return summary.substr(summary.empty() ? 0 : 1);
 }
 
 class SearchTest : public ::testing::Test {
  protected:
-  // Each test starts and ends with no reported events.
-  void SetUp() override { ReleaseSharedReporter(); }
-  void TearDown() override { ReleaseSharedReporter(); }
-
-  // A synchronous run, its text parsed.
-  static xml::DocumentPtr Run(std::string_view options, xml::DocumentPtr fingerprint = nullptr,
-                              xml::DocumentPtr applicationOptions = nullptr,
-                              std::unique_ptr<fs::FileSystem> fileSystem = nullptr) {
-    Search search(fileSystem ? std::move(fileSystem) : fs::CreatePosixFileSystem({}));
+  // A synchronous run, its text parsed; `selection` is the application options.
+  static xml::DocumentPtr Run(const std::string& options, xml::DocumentPtr fingerprint = nullptr,
+                              xml::DocumentPtr selection = nullptr) {
+    Search search(fs::CreatePosixFileSystem({}));
     search.Asynchronous(false);
-    return Parse(search.Start(options.empty() ? std::make_shared<xml::Document>() : Parse(options),
-                              std::move(applicationOptions), std::move(fingerprint)));
-  }
-
-  // A folder of the tree as a d_text records it.
-  std::string Folder(std::string_view relative = "") const { return tree_.Path(relative) + "\\"; }
-
-  std::vector<std::string> FoldersIn(xml::Document& results) const {
-    return FoldersBelow(results, tree_.Path());
+    return Parse(search.Start(Parse(options), std::move(selection), std::move(fingerprint)));
   }
 
   TempTree tree_;

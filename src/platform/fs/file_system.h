@@ -73,6 +73,9 @@ class FileSystem {
   // kPermissionDenied (70) when it cannot be reached.
   virtual std::unique_ptr<File> GetFile(std::string_view path) = 0;
   virtual std::unique_ptr<Folder> GetFolder(std::string_view path) = 0;
+  // Drops whatever was learnt of the disk (listings, lookups), so that what follows sees it as it
+  // is now. A stage calls it as each run begins: nothing learnt in one run is used by the next.
+  virtual void Forget() {}
 };
 
 }  // namespace trl::fs

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cerrno>
 #include <functional>
 #include <string>
@@ -24,30 +25,19 @@ std::string Summary(const FolderListing& listing) {
   return text;
 }
 
-// Every folder has two files; the names of the folders that walks pass over end in "1".
+// Six folders a0..a5, each with five b0..b4, each with three c0..c2; every folder has two files.
+// The names of the folders that walks pass over end in "1".
 class ListingReadAheadTest : public ::testing::Test {
  protected:
-  void SetUp() override {
-    const auto add = [&](const std::string& folder) {
-      if (!folder.empty()) tree_.AddFolder(folder);
-      std::string prefix = folder.empty() ? "" : folder + "/";
-      tree_.AddFile(prefix + "x");
-      tree_.AddFile(prefix + "y");
-    };
-    add("");
-    for (char a = '0'; a < '6'; ++a) {
-      std::string first = std::string("a") + a;
-      add(first);
-      for (char b = '0'; b < '5'; ++b) {
-        std::string second = first + "/b" + b;
-        add(second);
-        for (char c = '0'; c < '3'; ++c) add(second + "/c" + c);
-      }
+  void SetUp() override { Fill("", 0); }
+  void Fill(const std::string& folder, size_t depth) {
+    tree_.AddFile(folder + "x");
+    tree_.AddFile(folder + "y");
+    for (int i = 0; depth < 3 && i < std::array{6, 5, 3}[depth]; ++i) {
+      std::string sub = folder + char('a' + depth) + std::to_string(i) + "/";
+      tree_.AddFolder(sub);
+      Fill(sub, depth + 1);
     }
-  }
-
-  std::shared_ptr<FolderPlace> Root() const {
-    return std::make_shared<FolderPlace>(tree_.Root(), tree_.Path());
   }
 
   TempTree tree_;
@@ -74,8 +64,7 @@ TEST_F(ListingReadAheadTest, EveryFolderGetsItsOwnListingWhateverTheWalk) {
   for (const Case& c : cases) {
     SCOPED_TRACE(c.walk);
     ListingReadAhead readAhead(c.maxFolders, c.maxEntries);
-    int taken = 0;
-    int visited = 0;
+    int taken = 0, visited = 0;
     std::function<void(const std::shared_ptr<FolderPlace>&)> walk =
         [&](const std::shared_ptr<FolderPlace>& folder) {
           ++visited;
@@ -93,18 +82,17 @@ TEST_F(ListingReadAheadTest, EveryFolderGetsItsOwnListingWhateverTheWalk) {
             if (!(c.skipOnes && sub.nativeName.ends_with('1'))) walk(sub.place);
           }
         };
-    walk(Root());
+    walk(std::make_shared<FolderPlace>(tree_.Root(), tree_.Path()));
     EXPECT_EQ(visited, c.skipOnes ? 1 + 5 + 5 * 4 + 5 * 4 * 2 : 1 + 6 + 6 * 5 + 6 * 5 * 3);
   }
 }
 
+// A folder that cannot be listed gives its error, as a direct listing would.
 TEST_F(ListingReadAheadTest, AFolderThatCannotBeListedGivesItsError) {
   ListingReadAhead readAhead;
-  readAhead.Take(Root());
-  auto missing = std::make_shared<FolderPlace>(tree_.Native("nowhere"), "");
-  EXPECT_EQ(readAhead.Take(missing).error, ENOENT);
-  auto file = std::make_shared<FolderPlace>(tree_.Native("a0/x"), "");
-  EXPECT_EQ(readAhead.Take(file).error, ENOTDIR);
+  for (const auto& [name, error] : {std::pair{"", 0}, {"nowhere", ENOENT}, {"a0/x", ENOTDIR}}) {
+    EXPECT_EQ(readAhead.Take(std::make_shared<FolderPlace>(tree_.Native(name), "")).error, error);
+  }
 }
 
 }  // namespace

@@ -41,11 +41,7 @@ std::string ParentOf(const std::string& path, char separator) {
 // Not safe for use by several threads at once: a run owns one.
 class PosixFileSystem final : public FileSystem {
  public:
-  explicit PosixFileSystem(ShareTable shares)
-      : shares_(std::move(shares)),
-        memory_(std::make_shared<WalkMemory>()),
-        readAhead_(std::thread::hardware_concurrency() > 1 ? std::make_shared<ListingReadAhead>()
-                                                           : nullptr) {}
+  explicit PosixFileSystem(ShareTable shares) : shares_(std::move(shares)) {}
 
   bool FileExists(std::string_view path) override {
     Item item;
@@ -78,19 +74,21 @@ class PosixFileSystem final : public FileSystem {
                      ? item.place
                      : std::make_shared<FolderPlace>(std::move(item.native), std::move(item.path));
     return std::make_unique<PosixFolder>(std::move(place), std::move(item.nativeName),
-                                         item.shareRoot, item.status, memory_, readAhead_);
+                                         item.shareRoot, item.status, run_.memory, run_.readAhead);
   }
+
+  void Forget() override { run_ = RunMemory{}; }
 
  private:
   // Returns 0 and the item `text` names, or an errno value (ENOENT for a network path that
   // leads nowhere).
   int Find(std::string_view text, Item& item) {
-    if (last_ && lastText_ == text) {
-      item = *last_;
+    if (run_.last && run_.lastText == text) {
+      item = *run_.last;
       return 0;
     }
-    last_.reset();
-    if (auto listed = memory_->Take(text)) {
+    run_.last.reset();
+    if (auto listed = run_.memory->Take(text)) {
       item.place = std::move(listed->place);
       item.nativeName = std::move(listed->nativeName);
       item.mustBeFolder = true;
@@ -124,8 +122,8 @@ class PosixFileSystem final : public FileSystem {
   }
 
   void Remember(std::string_view text, const Item& item) {
-    lastText_ = text;
-    last_ = item;
+    run_.lastText = text;
+    run_.last = item;
   }
 
   // Finds the native item `path` names: through the share table for a network path, with one
@@ -148,21 +146,29 @@ class PosixFileSystem final : public FileSystem {
     }
     int error = Stat(native, status);
     if (error != ENOENT && error != ENOTDIR) return error;
-    error = resolver_.Resolve(local.absolute, names, native);
+    error = run_.resolver.Resolve(local.absolute, names, native);
     return error != 0 ? error : Stat(native, status);
   }
 
+  // What the file system learns of the disk in one run, all of it dropped by Forget: a run that
+  // used an earlier run's listings would see files that are gone and miss new ones.
+  struct RunMemory {
+    NameResolver resolver;
+    std::shared_ptr<WalkMemory> memory = std::make_shared<WalkMemory>();
+    // One thread more lists ahead of a walk; with a single core it would only take turns with it.
+    std::shared_ptr<ListingReadAhead> readAhead = std::thread::hardware_concurrency() > 1
+                                                      ? std::make_shared<ListingReadAhead>()
+                                                      : nullptr;
+    // A walker asks about each subfolder it has listed three times running, with one text:
+    // FileExists, FolderExists and GetFolder of the subfolder's Path and "\". The last folder
+    // found is remembered with its text, so the three cost one stat; any other lookup drops it,
+    // and files are never remembered, so a file's coming and going is seen at once.
+    std::string lastText;
+    std::optional<Item> last;
+  };
+
   ShareTable shares_;
-  NameResolver resolver_;
-  std::shared_ptr<WalkMemory> memory_;
-  // One thread more lists ahead of a walk; with a single core it would only take turns with it.
-  std::shared_ptr<ListingReadAhead> readAhead_;
-  // A walker asks about each subfolder it has listed three times running, with one text:
-  // FileExists, FolderExists and GetFolder of the subfolder's Path and "\". The last folder found
-  // is remembered with its text, so the three cost one stat; any other lookup drops it, and files
-  // are never remembered, so a file's coming and going is seen at once.
-  std::string lastText_;
-  std::optional<Item> last_;
+  RunMemory run_;
 };
 
 }  // namespace
