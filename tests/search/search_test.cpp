@@ -36,7 +36,8 @@ TEST_F(SearchTest, RunRecordsWhatItsEntryAdmits) {
       R"(a_id='2'><f f_name='b' f_relpath='\A\B' f_fullpath=''/></a><a a_id='5' a_parent='1'>)" +
       R"(<f f_name='A' f_relpath='A' f_fullpath=''/></a><a a_id='7'><f f_name='T' f_relpath='')" +
       " f_fullpath=''/></a><a a_id='3'><f f_name='b' f_relpath='" + full + "' f_fullpath='True'/>" +
-      "</a><a a_id='4'><f f_name='b' f_relpath='" + full + "' f_fullpath='true'/></a></fp>");
+      "</a><a a_id='4'><f f_name='b' f_relpath='" + full + "' f_fullpath='true'/></a><a a_id='6'>" +
+      "<f f_name='T' f_relpath=''/></a></fp>");
   const std::pair<std::string, std::string> cases[] = {
       {walk(""), R"(\ T r.x|\A\ a|\A\B\ B|\e\S\ s|\r\ y)"},
       {walk(R"(d_search_f_attributes="6")"), R"(\ .h T p|\A\ a|\A\B\ B|\e\S\ s|\r\ y)"},
@@ -50,8 +51,9 @@ TEST_F(SearchTest, RunRecordsWhatItsEntryAdmits) {
       {probe("2"), R"(\a\b\ B)"},
       {probe("3"), R"(\a\b\ B)"},
       {probe("4"), "\\" + Lower(full.substr(1)) + "\\"},  // only "True" makes a path full
-      {probe("7"), ""},                                   // not selected
-      {probe("8"), "-2147201302"},                        // not in the fingerprint
+      {probe("6"), R"(\ T)"},       // a file in the folder itself needs no f_fullpath
+      {probe("7"), ""},             // not selected
+      {probe("8"), "-2147201302"},  // not in the fingerprint
   };
   auto applicationOptions = Parse("<o><a a_id='7' a_selected='0'/></o>");
   for (const auto& [options, expected] : cases)
