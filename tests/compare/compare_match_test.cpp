@@ -202,23 +202,6 @@ TEST_F(CompareMatchTest, IncompleteCopiesAreOnlyLeftOutWhenPruningWouldTakeThemO
   EXPECT_THAT(ValuesOf(*shared, "//a/v", "f_act"), ElementsAre("2"));
 }
 
-// A find reaches the first copy whose f_id is written as its own id reads plainly ("01" reads as
-// 1 but is not written "1"), whether the copy is made at once or kept aside until the version is
-// complete.
-TEST_F(CompareMatchTest, FindsReachTheFirstCopyWrittenAsTheirId) {
-  for (const char* name : {"a.exe", "b.exe", "c.exe"}) tree_.AddFile(name);
-  const std::string files =
-      R"(<v v_id="1" v_seq="1"><f f_id="01" f_name="a.exe" f_weight="0"/>)"
-      R"(<f f_id="1" f_name="b.exe" f_weight="1"/><f f_id="1" f_name="c.exe" f_weight="0"/></v>)";
-  std::string local = LocalFiles({{Folder(), {"a.exe", "b.exe", "c.exe"}}});
-  for (const char* application : {"<a a_id='1'>", "<a a_name='no id'>"}) {
-    SCOPED_TRACE(application);
-    auto results = Run(std::string("<fp>") + application + files + "</a></fp>", local);
-    EXPECT_THAT(ValuesOf(*results, "//a/v/f", "f_exists"), ElementsAre("0", "1", "0"));
-    EXPECT_THAT(ValuesOf(*results, "//a/v", "f_act"), ElementsAre("1"));
-  }
-}
-
 // Every copy an application's pruning empties goes, each taking its folder; the copy between them
 // and the next application's copies stay.
 TEST_F(CompareMatchTest, PruningTakesOutEveryEmptiedCopyOfTheApplication) {
