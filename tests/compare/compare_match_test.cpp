@@ -105,11 +105,12 @@ TEST_F(CompareMatchTest, VersionsAreFiledUnderEachFolderAndPrunedWhenAWeightedFi
   struct Case {
     std::string fingerprint, localFiles, summary;
   } cases[] = {
-      // Only files of weight above 0 make a version incomplete; the highest v_seq is taken over
-      // every version, found or not.
+      // Only files of weight above 0 (as a number, fractions too) make a version incomplete; the
+      // highest v_seq is taken over every version, found or not.
       {"<a a_id='1'>" + Version("v_id='1' v_name='v1' v_seq='1'", "a.exe:1 x.dll:2") +
            Version("v_id='2' v_name='v2' v_seq='2'", "a.exe:1 optional.dll:0") +
-           Version("v_id='3' v_name='v3' v_seq='5'", "never.exe:1") + "</a><a a_id='2'>" +
+           Version("v_id='3' v_name='v3' v_seq='5'", "never.exe:1") +
+           Version("v_id='4' v_name='v4' v_seq='1'", "a.exe:1 half.dll:0.5") + "</a><a a_id='2'>" +
            Version("v_id='1' v_name='w' v_seq='1'", "a.exe:1 gone.dll:1") + "</a>",
        LocalFiles({{"\\p\\", {"a.exe", "gone.dll"}}}), "c=localhost d=\\p\\ a=1^5 v2 1/2/1"},
       // Every copy the pruning empties goes with its folder; the copy between them and the next

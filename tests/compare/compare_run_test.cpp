@@ -12,7 +12,7 @@ namespace {
 
 using ::testing::ElementsAre;
 
-// Notes what a run reports, in order: "S<e_status>" and "P<a_id>:<e_matched>".
+// Notes what a run reports, in order: "S<e_status>" and "P<a_id>:<e_matched>:<e_match_count>".
 class CompareRunTest : public CompareTest {
  protected:
   CompareRunTest() {
@@ -23,8 +23,10 @@ class CompareRunTest : public CompareTest {
     });
     compare_.OnProgressUpdate([this](const std::string& update) {
       auto e = Parse(update);
-      reports_.push_back("P" + *e->DocumentElement().FirstChild().GetAttribute("a_id") + ":" +
-                         *e->DocumentElement().GetAttribute("e_matched"));
+      xml::Node root = e->DocumentElement();
+      reports_.push_back("P" + *root.FirstChild().GetAttribute("a_id") + ":" +
+                         *root.GetAttribute("e_matched") + ":" +
+                         *root.GetAttribute("e_match_count"));
       if (reports_.back() == cancelAt_) compare_.Cancel();
     });
   }
@@ -69,11 +71,11 @@ TEST_F(CompareRunTest, RejectedApplicationsLeaveNoTraceAndCancelEndsBeforeTheNex
     fingerprint += "<a a_id='" + std::to_string(i + 1) + "'>" +
                    Version("v_id='1' v_seq='1'", files[i]) + "</a>";
   }
-  cancelAt_ = "P3:1";
+  cancelAt_ = "P3:1:1";
   RunToEnd(fingerprint + "</fp>",
            LocalFiles({{"\\", {"one.exe", "two.exe", "three.exe", "four.exe"}}}),
            Parse("<options><a a_id='1' a_selected='0'/></options>"));
-  EXPECT_THAT(reports_, ElementsAre("S1", "S2", "P2:0", "P3:0", "P3:1", "S255"));
+  EXPECT_THAT(reports_, ElementsAre("S1", "S2", "P2:0:0", "P3:0:0", "P3:1:1", "S255"));
   EXPECT_EQ(compare_.Status(), kStatusCancelled);
   EXPECT_EQ(Attribute("e_a_count"), "2");
   EXPECT_EQ(Attribute("e_match_count"), "1");
