@@ -92,12 +92,16 @@ TEST_F(CompareMatchTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFol
       Computer("elsewhere", "c_local='0'", "apps", {{"\\bin\\", {"acme.exe"}}}) +
       "</trl_applicationdata>";
   std::vector<std::string> tested;
-  Run(R"(<fp><a a_id="1"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" f_name="Acme.exe" )"
-      R"(f_relpath="bin" f_weight="1"/></v></a></fp>)",
-      localFiles, true, std::make_unique<NamedFiles>(&tested));
+  std::string results =
+      Run(R"(<fp><a a_id="1"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" f_name="Acme.exe" )"
+          R"(f_relpath="bin" f_weight="1"/></v></a></fp>)",
+          localFiles, true, std::make_unique<NamedFiles>(&tested));
   EXPECT_THAT(tested,
               ElementsAre("/mnt\\acme\\bin\\acme.exe", "\\\\fileserver\\apps\\acme\\bin\\acme.exe",
                           "\\\\elsewhere\\apps\\bin\\acme.exe"));
+  EXPECT_EQ(Summary(results),
+            "c=localhost d=\\acme\\ a=1^1 v 1/1/1 c=fileserver d=\\acme\\ a=1^1 v 1/1/1 "
+            "c=elsewhere d=\\ a=1^1 v 1/1/1");
 }
 
 // Whole scenarios, drafting on and off.
