@@ -52,6 +52,10 @@ class Compare : public Worker {
   void AddStatusCounters(xml::Node e) override;
   void ReleaseDocuments() override;
 
+  // Off: every find is filed at once through the find-or-add steps, with no version copy kept
+  // aside and no place remembered; the results must not change.
+  void DraftCopies(bool on) { draftCopies_ = on; }
+
  private:
   // One results copy of an application, with the ids of its computer, drive and folder: Compare
   // only appends, and each level is numbered from a growing counter, so these ids order the copies
@@ -74,9 +78,10 @@ class Compare : public Worker {
   // The computer, drive, application folder and application copy of a find, found or added;
   // false when a step failed.
   bool FindPlace(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder);
-  // Whether the application's copies will certainly be pruned once its versions are matched, so
-  // that version copies can be drafted first and made only when complete.
-  bool PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const;
+  // The versions of `a` (the ids of `versions`) whose copies can be drafted first and made only
+  // when complete: those the application's pruning will certainly find in their final state.
+  std::unordered_set<const void*> DraftableVersions(const xml::Node& a,
+                                                    const std::vector<xml::Node>& versions) const;
   void MakeVersionCopy(const xml::Node& v, const VersionDraft& draft);
   void RaiseApplicationProgress(xml::Node a, bool matched);
   // The path of the candidate's file named `name`, on its own computer or through the network.
@@ -117,7 +122,8 @@ class Compare : public Worker {
   int32_t lngDriveCounter = 0;
   int32_t lngFolderCounter = 0;
   std::string startTime_;  // formatted
-  xml::Node draftsFor_;    // the application whose version copies are drafted, if any
+  bool draftCopies_ = true;
+  std::unordered_set<const void*> draftedVersions_;  // of the application being matched
   // A place the application being matched was found in: the listed drive and the fingerprint
   // application, with the computer, drive, folder and copy the results hold for them.
   struct FoundPlace {

@@ -132,13 +132,13 @@ bool Compare::MatchApplication(xml::Node a) {
   bool found = false;
   std::vector<xml::Node> versions;
   on([&] { versions = a.GetElementsByTagName(vocab::v); });
-  draftsFor_ = PrunedAfterwards(a, versions) ? a : xml::Node();
+  draftedVersions_ = DraftableVersions(a, versions);
   placesFound_.clear();
   for (const xml::Node& v : versions) {
     on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
     if (MatchVersion(v)) found = true;
   }
-  draftsFor_ = xml::Node();
+  draftedVersions_.clear();
   placesFound_.clear();
   if (found) {
     int16_t remaining = 0;
@@ -162,31 +162,39 @@ void Compare::RaiseApplicationProgress(xml::Node a, bool matched) {
   });
 }
 
-bool Compare::PrunedAfterwards(const xml::Node& a, const std::vector<xml::Node>& versions) const {
-  // Its copies are pruned only when its a_id can be read and selected by; and a version copy is
-  // final once its version is matched only when no later version of the application shares its
-  // v_id (and so its copy).
+std::unordered_set<const void*> Compare::DraftableVersions(
+    const xml::Node& a, const std::vector<xml::Node>& versions) const {
+  // Its copies are pruned only when its a_id can be read and selected by. A version's copy can
+  // wait until the version is matched only when no other version matched with the application can
+  // reach it: none shares its v_id (an application nested with the same a_id files its versions
+  // in the same copies), nor lacks one while it is empty (a find-or-add then looks for "").
+  // A version without a v_id gets a new copy at every find.
+  std::unordered_set<const void*> drafted;
   std::optional<std::string> id = a.GetAttribute(vocab::a_id);
-  if (!id || id->find('\'') != std::string::npos || !objSchema) return false;
-  std::unordered_set<std::string> ids;
+  if (!draftCopies_ || !id || id->find('\'') != std::string::npos || !objSchema) return drafted;
+  std::unordered_map<std::string, int> versionsById;
+  for (const xml::Node& v : versions) ++versionsById[v.GetAttribute(vocab::v_id).value_or("")];
   for (const xml::Node& v : versions) {
     auto versionId = v.GetAttribute(vocab::v_id);
-    if (versionId && v.ParentNode() == a && !ids.insert(*versionId).second) return false;
+    if (versionId && v.ParentNode() == a && versionsById[*versionId] == 1) drafted.insert(v.Id());
   }
-  return true;
+  return drafted;
 }
 
 // One fingerprint version being matched: what its last find made or found (kept when a step
 // fails, as a failed step leaves its value), and its drafted copies.
 struct Compare::VersionMatch {
-  VersionMatch(xml::Node v, const std::vector<xml::Node>& files, bool drafting)
-      : v(v), files(files), drafting(drafting) {}
+  VersionMatch(xml::Node v, const std::vector<xml::Node>& files, bool drafting, bool placesKept)
+      : v(v), files(files), drafting(drafting), placesKept(placesKept) {}
 
   static constexpr size_t kNoDraft = SIZE_MAX;  // the copy was made already: no draft
 
   xml::Node v;
   const std::vector<xml::Node>& files;
   bool drafting;
+  // Whether the places of finds are remembered: an application without an a_id gets a new copy at
+  // every find.
+  bool placesKept;
   std::optional<VersionFiles> shape;
   std::vector<VersionDraft> drafts;
   std::unordered_map<const void*, size_t> draftOf;  // by application copy
@@ -198,8 +206,8 @@ bool Compare::MatchVersion(xml::Node v) {
   bool found = false;
   std::vector<xml::Node> files;
   on([&] { files = v.GetElementsByTagName(vocab::f); });
-  // Copies of this version are drafted when the application's pruning follows for certain.
-  VersionMatch match(v, files, draftsFor_ && v.ParentNode() == draftsFor_);
+  VersionMatch match(v, files, draftedVersions_.contains(v.Id()),
+                     draftCopies_ && v.ParentNode().GetAttribute(vocab::a_id));
   // What a failed step would have produced keeps its value from the file or candidate before.
   std::string name, key, appFolder;
   int16_t mask = -1;
@@ -235,22 +243,26 @@ bool Compare::MatchVersion(xml::Node v) {
 void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
                          const std::string& appFolder, const FingerprintFile& file, int16_t mask) {
   OnError on{kClass, compare::kMatchVersionLabel};
-  // While one application is matched the results only grow, so a place found once is found again
-  // by the same find-or-add steps, which add nothing and report nothing then.
-  // Keyed by the listed drive rather than its names: a computer listed twice only costs a second
-  // find of the same place.
-  const void* application = match.v.ParentNode().Id();
-  auto& here = placesFound_[appFolder];
-  auto known = std::find_if(here.begin(), here.end(), [&](const FoundPlace& place) {
-    return place.drive == record.DriveIndex() && place.application == application;
-  });
-  if (known != here.end()) {
-    match.c = known->c;
-    match.m = known->m;
-    match.d = known->d;
-    match.aResult = known->a;
-  } else if (FindPlace(match, record, appFolder)) {
-    here.push_back({record.DriveIndex(), application, match.c, match.m, match.d, match.aResult});
+  if (match.placesKept) {
+    // While one application is matched the results only grow, so a place found once is found
+    // again by the same find-or-add steps, which add nothing and report nothing then.
+    // Keyed by the listed drive rather than its names: a computer listed twice only costs a
+    // second find of the same place.
+    const void* application = match.v.ParentNode().Id();
+    auto& here = placesFound_[appFolder];
+    auto known = std::find_if(here.begin(), here.end(), [&](const FoundPlace& place) {
+      return place.drive == record.DriveIndex() && place.application == application;
+    });
+    if (known != here.end()) {
+      match.c = known->c;
+      match.m = known->m;
+      match.d = known->d;
+      match.aResult = known->a;
+    } else if (FindPlace(match, record, appFolder)) {
+      here.push_back({record.DriveIndex(), application, match.c, match.m, match.d, match.aResult});
+    }
+  } else {
+    FindPlace(match, record, appFolder);
   }
   if (match.drafting && match.aResult) {
     auto [at, added] = match.draftOf.try_emplace(match.aResult.Id(), match.drafts.size());

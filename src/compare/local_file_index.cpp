@@ -69,24 +69,9 @@ std::string_view LocalFileRecord::EncodedFilename() const {
   return index_->NameAt(index_->records_[record_].encodedFilename);
 }
 
-std::string LocalFileRecord::FullPath() const {
-  std::string path;
-  if (!LocalMachine()) path = "\\\\" + Machine() + "\\";
-  path += Drive();
-  path += Folder();
-  path += Filename();
-  return path;
-}
-
 LocalFileIndex::Matches::Iterator& LocalFileIndex::Matches::Iterator::operator++() {
   record_ = index_->records_[record_].next;
   return *this;
-}
-
-size_t LocalFileIndex::Matches::size() const {
-  size_t count = 0;
-  for (uint32_t at = first_; at != kNone; at = index_->records_[at].next) ++count;
-  return count;
 }
 
 void LocalFileIndex::Reserve(size_t files) {

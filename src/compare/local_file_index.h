@@ -25,8 +25,6 @@ class LocalFileRecord {
   const std::string& EncodedFolder() const;
   std::string_view Filename() const;
   std::string_view EncodedFilename() const;
-  // Drive, folder and file name joined; behind "\\" and the computer when it is not this one.
-  std::string FullPath() const;
 
  private:
   friend class LocalFileIndex;
@@ -63,7 +61,6 @@ class LocalFileIndex {
     Iterator begin() const { return {index_, first_}; }
     Iterator end() const { return {index_, kNone}; }
     bool empty() const { return first_ == kNone; }
-    size_t size() const;
 
    private:
     friend class LocalFileIndex;

@@ -9,9 +9,9 @@
 #include <vector>
 
 #include "frame/error_handler.h"
-#include "platform/fs/posix/posix_file_system.h"
+#include "platform/failure.h"
 #include "support/documents.h"
-#include "support/temp_tree.h"
+#include "support/memory_file.h"
 #include "trl/compare.h"
 
 namespace trl::testing {
@@ -22,28 +22,68 @@ struct LocalFolder {
   std::vector<std::string> files;
 };
 
-// A local-files document with one computer and one drive; names need no escapes.
-inline std::string LocalFiles(const std::vector<LocalFolder>& folders,
-                              std::string_view computer = "localhost",
-                              std::string_view local = R"(c_local="1")",
-                              std::string_view drive = "") {
-  std::string text =
-      R"(<trl_applicationdata search_start="s0" search_end="s1"><c c_id="1" c_text=")" +
-      std::string(computer) + R"(" c_name=")" + Lower(std::string(computer)) + "\" " +
-      std::string(local) + R"(><m m_id="1" m_text=")" + std::string(drive) + R"(" m_name=")" +
-      Lower(std::string(drive)) + "\">";
-  int folderId = 0, fileId = 0;
+// A computer of a local-files document with one drive; names need no escapes. A file's f_name is
+// its name as given: letter case must not matter to lookups.
+inline std::string Computer(std::string_view name, std::string_view local, std::string_view drive,
+                            const std::vector<LocalFolder>& folders) {
+  std::string text = "<c c_text='" + std::string(name) + "' c_name='" + Lower(std::string(name)) +
+                     "' " + std::string(local) + "><m m_text='" + std::string(drive) +
+                     "' m_name='" + Lower(std::string(drive)) + "'>";
   for (const LocalFolder& folder : folders) {
-    text += "<d d_id=\"" + std::to_string(++folderId) + "\" d_text=\"" + folder.text +
-            "\" d_name=\"" + Lower(folder.text) + "\">";
-    for (const std::string& name : folder.files) {
-      text += "<f f_id=\"" + std::to_string(++fileId) + "\" f_text=\"" + name + "\" f_name=\"" +
-              Lower(name) + "\"/>";
+    text += "<d d_text='" + folder.text + "' d_name='" + Lower(folder.text) + "'>";
+    for (const std::string& file : folder.files) {
+      text += "<f f_text='" + file + "' f_name='" + file + "'/>";
     }
     text += "</d>";
   }
-  return text + "</m></c></trl_applicationdata>";
+  return text + "</m></c>";
 }
+
+// A local-files document with this computer alone.
+inline std::string LocalFiles(const std::vector<LocalFolder>& folders) {
+  return "<trl_applicationdata search_start='s0' search_end='s1'>" +
+         Computer("localhost", "c_local='1'", "", folders) + "</trl_applicationdata>";
+}
+
+// A fingerprint version: `files` as "name:weight ...", numbered from 1.
+inline std::string Version(std::string_view attributes, std::string_view files) {
+  std::string text = "<v " + std::string(attributes) + ">";
+  int id = 0;
+  for (const std::string& file : Words(files)) {
+    size_t colon = file.find(':');
+    text += "<f f_id='" + std::to_string(++id) + "' f_name='" + file.substr(0, colon) +
+            "' f_weight='" + file.substr(colon + 1) + "'/>";
+  }
+  return text + "</v>";
+}
+
+// Every file asked for exists but those whose name holds "gone"; its content is its own name and
+// it was last written 2024-05-06 07:08:09. Every path tested is noted.
+class NamedFiles : public fs::FileSystem {
+ public:
+  explicit NamedFiles(std::vector<std::string>* tested = nullptr) : tested_(tested) {}
+
+  bool FileExists(std::string_view path) override {
+    if (tested_) tested_->emplace_back(path);
+    return path.find("gone") == std::string_view::npos;
+  }
+  bool FolderExists(std::string_view) override { return false; }
+  std::unique_ptr<fs::File> GetFile(std::string_view path) override {
+    std::string name(path.substr(path.rfind('\\') + 1));
+    return std::make_unique<MemoryFile>(name, name, DateTime{2024, 5, 6, 7, 8, 9});
+  }
+  std::unique_ptr<fs::Folder> GetFolder(std::string_view) override { Fail(kPathNotFound); }
+
+ private:
+  std::vector<std::string>* tested_;
+};
+
+class SwitchedCompare : public Compare {
+ public:
+  SwitchedCompare(bool draft, std::unique_ptr<fs::FileSystem> files) : Compare(std::move(files)) {
+    DraftCopies(draft);
+  }
+};
 
 class CompareTest : public ::testing::Test {
  protected:
@@ -51,20 +91,32 @@ class CompareTest : public ::testing::Test {
   void SetUp() override { ReleaseSharedReporter(); }
   void TearDown() override { ReleaseSharedReporter(); }
 
-  // A synchronous run, its text parsed.
-  static xml::DocumentPtr Run(std::string_view fingerprint, std::string_view localFiles,
-                              xml::DocumentPtr applicationOptions = nullptr,
-                              fs::ShareTable shares = {}) {
-    Compare compare(fs::CreatePosixFileSystem(std::move(shares)));
+  // The text of a synchronous run, on NamedFiles unless `files` are given.
+  static std::string Run(std::string_view fingerprint, std::string_view localFiles,
+                         bool draft = true, std::unique_ptr<fs::FileSystem> files = nullptr) {
+    SwitchedCompare compare(draft, files ? std::move(files) : std::make_unique<NamedFiles>());
     compare.Asynchronous(false);
-    return Parse(
-        compare.Start(std::move(applicationOptions), Parse(localFiles), Parse(fingerprint)));
+    return compare.Start(nullptr, Parse(localFiles), Parse(fingerprint));
   }
-
-  // A folder of the tree as a d_text records it.
-  std::string Folder(std::string_view relative = "") const { return tree_.Path(relative) + "\\"; }
-
-  TempTree tree_;
 };
+
+// The results in document order, in short: "c=c_text d=d_text a=a_id^a_max_seq v_name
+// f_act/f_max/v_act ...".
+inline std::string Summary(std::string_view results) {
+  auto document = Parse(results);
+  std::string text;
+  for (const xml::Node& e : document->AsNode().SelectNodes("/*/c | //d | //d/a | //a/v")) {
+    auto value = [&](const char* name) { return e.GetAttribute(name).value_or("-"); };
+    std::string tag = e.NodeName();
+    if (tag == "c") text += " c=" + value("c_text");
+    if (tag == "d") text += " d=" + value("d_text");
+    if (tag == "a") text += " a=" + value("a_id") + "^" + value("a_max_seq");
+    if (tag == "v") {
+      text += " " + value("v_name") + " " + value("f_act") + "/" + value("f_max") + "/" +
+              value("v_act");
+    }
+  }
+  return text.empty() ? text : text.substr(1);
+}
 
 }  // namespace trl::testing

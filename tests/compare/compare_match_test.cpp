@@ -1,10 +1,6 @@
-// Scoring found files, the candidates a run tests, and the pruning of incomplete versions.
-#include <fcntl.h>
+// Scoring found files, the candidates a run tests, and the copies it files and prunes.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
-
-#include <ctime>
 
 #include "compare/compare_fixture.h"
 #include "support/fault_injecting_file_system.h"
@@ -13,259 +9,151 @@ namespace trl::testing {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 using CompareMatchTest = CompareTest;
 
-std::vector<int32_t> EventNumbers(xml::Document& results) {
-  std::vector<int32_t> numbers;
-  for (const ReportedEvent& event : EventsIn(results)) numbers.push_back(event.number);
-  return numbers;
+std::vector<std::string> Events(const std::string& results) {
+  std::vector<std::string> events;
+  for (const ReportedEvent& event : EventsIn(*Parse(results))) events.push_back(event.description);
+  return events;
 }
 
 std::string OneFileFingerprint(std::string_view properties) {
-  return R"(<fp><a a_id="1" a_name="A"><v v_id="1" v_seq="1"><f f_id="1" f_name="data.bin" )"
-         R"(f_relpath="" f_weight="1">)" +
+  return R"(<fp><a a_id="1" a_name="A"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" )"
+         R"(f_name="data.bin" f_relpath="" f_weight="1">)" +
          std::string(properties) + "</f></v></a></fp>";
 }
 
+// data.bin holds "data.bin".
 TEST_F(CompareMatchTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
-  tree_.AddFile("data.bin", "abc");
-  std::tm written{};
-  written.tm_year = 124;  // 2024-05-06 07:08:09, local time
-  written.tm_mon = 4;
-  written.tm_mday = 6;
-  written.tm_hour = 7;
-  written.tm_min = 8;
-  written.tm_sec = 9;
-  written.tm_isdst = -1;
-  const timespec times[2] = {{std::mktime(&written), 0}, {std::mktime(&written), 0}};
-  ASSERT_EQ(utimensat(AT_FDCWD, tree_.Native("data.bin").c_str(), times, 0), 0);
-  const std::string size = R"(<p p_type="2" p_weight="1" p_value="3"/>)";
+  const std::string size = R"(<p p_type="2" p_weight="1" p_value="8"/>)";
   const std::string time = R"(<p p_type="4" p_weight="3" p_value="2024-05-06 07:08:09"/>)";
   struct Case {
     std::string properties;
     const char* mask;   // p_act
     const char* score;  // v_act: the file's bit only when every property agreed
-    std::vector<int32_t> events;
+    std::vector<std::string> events;
   } cases[] = {
       {size, "1", "1", {}},
-      {R"(<p p_type="2" p_weight="1" p_value="4"/>)", "0", "0", {}},
-      {R"(<p p_type="2" p_weight="1" p_value="three"/>)", "0", "0", {13}},
-      {R"(<p p_type="3" p_weight="2" p_value="900150983CD24FB0D6963F7D28E17F72"/>)", "2", "1", {}},
-      {R"(<p p_type="3" p_weight="2" p_value="900150983cd24fb0d6963f7d28e17f73"/>)", "0", "0", {}},
+      {R"(<p p_type="2" p_weight="1" p_value="9"/>)", "0", "0", {}},
+      {R"(<p p_type="2" p_weight="1" p_value="eight"/>)", "0", "0", {"Type mismatch"}},
+      {R"(<p p_type="3" p_weight="2" p_value="1094B026F81945A54E2B8F965AEE37DA"/>)", "2", "1", {}},
+      {R"(<p p_type="3" p_weight="2" p_value="1094b026f81945a54e2b8f965aee37db"/>)", "0", "0", {}},
       {R"(<p p_type="1" p_weight="1" p_value=""/>)", "1", "1", {}},
       {R"(<p p_type="1" p_weight="1" p_value="1.0.0.0"/>)", "0", "0", {}},
       {time, "4", "1", {}},
       {R"(<p p_type="4" p_weight="3" p_value="2024-05-06 07:08:10"/>)", "0", "0", {}},
-      {R"(<p p_type="4" p_weight="3" p_value="soon"/>)", "0", "0", {13}},
-      {R"(<p p_type="5" p_weight="1" p_value="3"/>)", "0", "0", {kErrUnknownPropertyType}},
+      {R"(<p p_type="4" p_weight="3" p_value="soon"/>)", "0", "0", {"Type mismatch"}},
+      {R"(<p p_type="5" p_weight="1" p_value="8"/>)", "0", "0", {"Unknown property type: 5"}},
       {size + R"(<p p_type="2" p_weight="2" p_value="9"/>)" + time, "5", "0", {}},
       // The mask cannot hold both; nor can the file's p_max hold their sum.
-      {R"(<p p_type="2" p_weight="15" p_value="3"/><p p_type="2" p_weight="15" p_value="3"/>)",
+      {R"(<p p_type="2" p_weight="15" p_value="8"/><p p_type="2" p_weight="15" p_value="8"/>)",
        "16384",
        "0",
-       {kOverflow, kOverflow}},
+       {"Overflow", "Overflow"}},
       {"", "0", "1", {}},
+      // A weight that cannot be read is reported by the upgrade and again at each test.
+      {R"(<p p_type="2" p_weight="x" p_value="8"/>)", "0", "1", {"Type mismatch", "Type mismatch"}},
   };
   for (const Case& c : cases) {
-    auto results = Run(OneFileFingerprint(c.properties), LocalFiles({{Folder(), {"data.bin"}}}));
+    auto results = Run(OneFileFingerprint(c.properties), LocalFiles({{"\\", {"data.bin"}}}));
     SCOPED_TRACE(c.properties);
-    EXPECT_THAT(ValuesOf(*results, "//a/v/f", "p_act"), ElementsAre(c.mask));
-    EXPECT_THAT(ValuesOf(*results, "//a/v", "v_act"), ElementsAre(c.score));
-    EXPECT_THAT(ValuesOf(*results, "//a/v", "f_act"), ElementsAre("1"));
-    EXPECT_EQ(EventNumbers(*results), c.events);
+    EXPECT_THAT(ValuesOf(*Parse(results), "//a/v/f", "p_act"), ElementsAre(c.mask));
+    EXPECT_EQ(Summary(results), std::string("c=localhost d=\\ a=1^1 v 1/1/") + c.score);
+    EXPECT_EQ(Events(results), c.events);
   }
-}
-
-TEST_F(CompareMatchTest, UnknownPropertyKindIsReportedByName) {
-  tree_.AddFile("data.bin");
-  auto results = Run(OneFileFingerprint(R"(<p p_type="7" p_weight="1" p_value="x"/>)"),
-                     LocalFiles({{Folder(), {"data.bin"}}}));
-  EXPECT_THAT(EventsIn(*results), ElementsAre(ReportedEvent{kErrUnknownPropertyType, 1, "Compare",
-                                                            "MatchFile", "Unknown property type: 7",
-                                                            "trlLocator.Compare.MatchFile"}));
 }
 
 // A file tested for several versions is looked at and opened once; a failure to read it is
 // still reported at each test.
 TEST_F(CompareMatchTest, FileTestedForSeveralVersionsIsReadOnceAndFailsEachTime) {
-  tree_.AddFile("data.bin", "abc");
-  auto system = fs::CreatePosixFileSystem({});
-  auto faulty = std::make_unique<FaultInjectingFileSystem>(*system);
+  NamedFiles files;
+  auto faulty = std::make_unique<FaultInjectingFileSystem>(files);
   FaultInjectingFileSystem& faults = *faulty;
-  faults.FailOn(FaultInjectingFileSystem::Operation::kOpenFile, tree_.Path("data.bin"), 57);
+  faults.FailOn(FaultInjectingFileSystem::Operation::kOpenFile, "\\memory\\data.bin", 57);
   std::string version = R"(<f f_id="1" f_name="data.bin" f_relpath="" f_weight="1">)"
-                        R"(<p p_type="2" p_weight="1" p_value="3"/>)"
+                        R"(<p p_type="2" p_weight="1" p_value="8"/>)"
                         R"(<p p_type="3" p_weight="2" p_value="x"/></f></v>)";
-  Compare compare(std::move(faulty));
-  compare.Asynchronous(false);
-  auto results = Parse(compare.Start(nullptr, Parse(LocalFiles({{Folder(), {"data.bin"}}})),
-                                     Parse(R"(<fp><a a_id="1"><v v_id="1" v_seq="1">)" + version +
-                                           R"(<v v_id="2" v_seq="2">)" + version + "</a></fp>")));
-  EXPECT_THAT(ValuesOf(*results, "//a/v/f", "p_act"), ElementsAre("1", "1"));
-  EXPECT_THAT(EventNumbers(*results), ElementsAre(57, 57));
+  auto results = Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1">)" + version +
+                         R"(<v v_id="2" v_seq="2">)" + version + "</a></fp>",
+                     LocalFiles({{"\\", {"data.bin"}}}), true, std::move(faulty));
+  EXPECT_THAT(ValuesOf(*Parse(results), "//a/v/f", "p_act"), ElementsAre("1", "1"));
+  EXPECT_THAT(Events(results), ElementsAre("Device I/O error", "Device I/O error"));
   EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kFileExists), 1);
-  EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kOpenFile), 1);
-}
-
-// A fingerprint file is read once for all its candidates, but what cannot be read is reported at
-// each candidate, in the order a fresh read would report it.
-TEST_F(CompareMatchTest, UnreadableFingerprintValuesAreReportedAtEachCandidate) {
-  tree_.AddFolder("two");
-  tree_.AddFile("data.bin", "abc");
-  tree_.AddFile("two/data.bin", "abc");
-  auto results = Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_name="data.bin" f_weight="1">)"
-                     R"(<p p_type="2" p_weight="x" p_value="3"/></f></v></a></fp>)",
-                     LocalFiles({{Folder(), {"data.bin"}}, {Folder("two"), {"data.bin"}}}));
-  std::vector<std::string> where;
-  for (const ReportedEvent& event : EventsIn(*results)) {
-    where.push_back(event.procedure + " " + std::to_string(event.number));
-  }
-  // Without an f_id the find reaches no copy of the file (91).
-  EXPECT_THAT(where,
-              ElementsAre("UpgradeFingerprintData 13", "FindCommonPath 94", "MatchFile 13",
-                          "UpdateFileDetails 94", "UpdateFileDetails 91", "FindCommonPath 94",
-                          "MatchFile 13", "UpdateFileDetails 94", "UpdateFileDetails 91"));
+  EXPECT_EQ(faults.Calls(FaultInjectingFileSystem::Operation::kGetFile), 1);
 }
 
 TEST_F(CompareMatchTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFits) {
-  for (const char* folder : {"local/Acme/bin", "share/Acme/bin", "local/Other"}) {
-    tree_.AddFolder(folder);
-    tree_.AddFile(std::string(folder) + "/Acme.exe", "x");
-  }
-  fs::ShareTable shares;
-  shares.Add("fileserver", "apps", tree_.Native("share"));
-  auto computer = [](const char* text, const char* local, const char* drive,
-                     const std::string& folder) {
-    return std::string("<c c_text='") + text + "' c_name='" + text + "' " + local + "><m m_text='" +
-           drive + "' m_name='" + drive + "'><d d_text='" + folder + "' d_name='" + Lower(folder) +
-           "'><f f_text='ACME.EXE' f_name='acme.exe'/></d></m></c>";
-  };
   std::string localFiles =
-      "<trl_applicationdata>" + computer("localhost", "c_local='1'", "", Folder("local/Acme/bin")) +
-      computer("localhost", "c_local='1'", "", Folder("local/Other")) +
-      computer("fileserver", "", "apps", "\\Acme\\bin\\") +
-      computer("elsewhere", "c_local='0'", "apps", "\\Acme\\bin\\") + "</trl_applicationdata>";
-  auto results = Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="Acme.exe" )"
-                     R"(f_relpath="bin" f_weight="1"/></v></a></fp>)",
-                     localFiles, nullptr, std::move(shares));
-  EXPECT_THAT(ValuesOf(*results, "/*/c", "c_text"), ElementsAre("localhost", "fileserver"));
-  EXPECT_THAT(ValuesOf(*results, "/*/c/m/d", "d_text"),
-              ElementsAre(Lower(Folder("local/Acme")), "\\acme\\"));
-  EXPECT_THAT(ValuesOf(*results, "//v", "f_act"), ElementsAre("1", "1"));
-  EXPECT_THAT(EventNumbers(*results), IsEmpty());
-}
-
-TEST_F(CompareMatchTest, FileFoundTwiceForOneVersionCountsOnce) {
-  tree_.AddFile("app.exe");
-  auto results = Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" )"
-                     R"(f_relpath="" f_weight="2"/></v></a></fp>)",
-                     LocalFiles({{Folder(), {"app.exe", "APP.EXE"}}}));
-  EXPECT_THAT(ValuesOf(*results, "//v", "f_act"), ElementsAre("1"));
-  EXPECT_THAT(ValuesOf(*results, "//v", "v_act"), ElementsAre("2"));
-}
-
-TEST_F(CompareMatchTest, VersionsMissingAWeightedFileAreRemoved) {
-  tree_.AddFolder("acme");
-  tree_.AddFile("acme/app.exe");
-  auto results =
-      Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
-          R"(<f f_id="2" f_name="x.dll" f_weight="2"/></v>)"
-          R"(<v v_id="2" v_seq="2"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
-          R"(<f f_id="2" f_name="optional.dll" f_weight="0"/></v>)"
-          R"(<v v_id="3" v_seq="5"><f f_id="1" f_name="never.exe" f_weight="1"/></v></a>)"
-          R"(<a a_id="2"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
-          R"(<f f_id="2" f_name="gone.dll" f_weight="1"/></v></a></fp>)",
-          LocalFiles({{Folder("acme"), {"app.exe"}}}));
-  EXPECT_THAT(ValuesOf(*results, "//d/a", "a_id"), ElementsAre("1"));
-  EXPECT_THAT(ValuesOf(*results, "//a", "a_max_seq"), ElementsAre("5"));
-  EXPECT_THAT(ValuesOf(*results, "//a/v", "v_id"), ElementsAre("2"));
-  EXPECT_THAT(ValuesOf(*results, "//a/v", "f_act"), ElementsAre("1"));
-}
-
-// Without pruning (no a_id to select by) an incomplete version stays; a later version with the
-// same v_id completes the copy the first one made.
-TEST_F(CompareMatchTest, IncompleteCopiesAreOnlyLeftOutWhenPruningWouldTakeThemOut) {
-  tree_.AddFile("a.exe");
-  tree_.AddFile("c.exe");
-  auto versions = [](const char* secondId) {
-    return R"(<v v_id="1" v_seq="1"><f f_id="1" f_name="a.exe" f_weight="1"/>)"
-           R"(<f f_id="2" f_name="b.dll" f_weight="1"/></v><v v_id=")" +
-           std::string(secondId) + R"(" v_seq="2"><f f_id="2" f_name="c.exe" f_weight="1"/></v>)";
-  };
-  std::string local = LocalFiles({{Folder(), {"a.exe", "c.exe"}}});
-  auto unnamed = Run("<fp><a a_name='no id'>" + versions("2") + "</a></fp>", local);
-  EXPECT_THAT(ValuesOf(*unnamed, "//a/v", "f_act"), ElementsAre("1", "1"));
-  auto shared = Run("<fp><a a_id='1'>" + versions("1") + "</a></fp>", local);
-  EXPECT_THAT(ValuesOf(*shared, "//a/v", "f_max"), ElementsAre("2"));
-  EXPECT_THAT(ValuesOf(*shared, "//a/v", "f_act"), ElementsAre("2"));
-}
-
-// A find reaches the first copy whose f_id is written as its own id reads plainly ("01" reads as
-// 1 but is not written "1"), whether the copy is made at once or kept aside until the version is
-// complete.
-TEST_F(CompareMatchTest, FindsReachTheFirstCopyWrittenAsTheirId) {
-  for (const char* name : {"a.exe", "b.exe", "c.exe"}) tree_.AddFile(name);
-  const std::string files =
-      R"(<v v_id="1" v_seq="1"><f f_id="01" f_name="a.exe" f_weight="0"/>)"
-      R"(<f f_id="1" f_name="b.exe" f_weight="1"/><f f_id="1" f_name="c.exe" f_weight="0"/></v>)";
-  std::string local = LocalFiles({{Folder(), {"a.exe", "b.exe", "c.exe"}}});
-  for (const char* application : {"<a a_id='1'>", "<a a_name='no id'>"}) {
-    SCOPED_TRACE(application);
-    auto results = Run(std::string("<fp>") + application + files + "</a></fp>", local);
-    EXPECT_THAT(ValuesOf(*results, "//a/v/f", "f_exists"), ElementsAre("0", "1", "0"));
-    EXPECT_THAT(ValuesOf(*results, "//a/v", "f_act"), ElementsAre("1"));
-  }
-}
-
-// Every copy an application's pruning empties goes, each taking its folder; the copy between them
-// and the next application's copies stay.
-TEST_F(CompareMatchTest, PruningTakesOutEveryEmptiedCopyOfTheApplication) {
-  for (const char* folder : {"one", "two", "three"}) {
-    tree_.AddFolder(folder);
-    tree_.AddFile(std::string(folder) + "/app.exe");
-  }
-  tree_.AddFile("two/x.dll");
-  tree_.AddFile("three/tool.exe");
-  auto results =
-      Run(R"(<fp><a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
-          R"(<f f_id="2" f_name="x.dll" f_weight="1"/></v></a>)"
-          R"(<a a_id="2"><v v_id="1" v_seq="1"><f f_id="1" f_name="tool.exe" f_weight="1"/>)"
-          R"(</v></a></fp>)",
-          LocalFiles({{Folder("one"), {"app.exe"}},
-                      {Folder("three"), {"app.exe", "tool.exe"}},
-                      {Folder("two"), {"app.exe", "x.dll"}}}));
-  EXPECT_THAT(ValuesOf(*results, "//d", "d_text"),
-              ElementsAre(Lower(Folder("two")), Lower(Folder("three"))));
-  EXPECT_THAT(ValuesOf(*results, "//d/a", "a_id"), ElementsAre("1", "2"));
-}
-
-TEST_F(CompareMatchTest, EmptiedBranchesGoUpToTheComputerOnlyWhenItIsTheOnlyOne) {
-  tree_.AddFolder("share");
-  tree_.AddFile("share/tool.exe");
-  tree_.AddFile("app.exe");
-  const std::string incomplete =
-      R"(<a a_id="1"><v v_id="1" v_seq="1"><f f_id="1" f_name="app.exe" f_weight="1"/>)"
-      R"(<f f_id="2" f_name="gone.dll" f_weight="1"/></v></a>)";
-  const std::string complete =
-      R"(<a a_id="2"><v v_id="1" v_seq="1"><f f_id="1" f_name="tool.exe" f_weight="1"/></v></a>)";
-  std::string local = LocalFiles({{Folder(), {"app.exe"}}});
-  auto alone = Run("<fp>" + incomplete + "</fp>", local);
-  EXPECT_EQ(alone->AsNode().CountNodes("/*/c"), 0u);
-
-  // The other computer's branch is made first, so the emptied computer stays, without drives.
-  std::string remote = LocalFiles({{"\\", {"tool.exe"}}}, "fileserver", "", "apps");
-  std::string both =
-      remote.substr(0, remote.find("</trl_applicationdata>")) +
-      local.substr(local.find("<c "), local.find("</trl_applicationdata>") - local.find("<c ")) +
+      "<trl_applicationdata>" +
+      Computer("localhost", "c_local='1'", "/mnt",
+               {{"\\Acme\\Bin\\", {"acme.exe"}}, {"\\Other\\", {"acme.exe"}}}) +
+      Computer("fileserver", "", "apps", {{"\\acme\\bin\\", {"ACME.EXE"}}}) +
+      Computer("elsewhere", "c_local='0'", "apps", {{"\\bin\\", {"acme.exe"}}}) +
       "</trl_applicationdata>";
-  fs::ShareTable shares;
-  shares.Add("fileserver", "apps", tree_.Native("share"));
-  auto two = Run("<fp>" + complete + incomplete + "</fp>", both, nullptr, std::move(shares));
-  EXPECT_THAT(ValuesOf(*two, "/*/c", "c_text"), ElementsAre("fileserver", "localhost"));
-  EXPECT_EQ(two->AsNode().CountNodes("/*/c[@c_text='localhost']/*"), 0u);
-  EXPECT_THAT(ValuesOf(*two, "//d/a", "a_id"), ElementsAre("2"));
+  std::vector<std::string> tested;
+  std::string results =
+      Run(R"(<fp><a a_id="1"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" f_name="Acme.exe" )"
+          R"(f_relpath="bin" f_weight="1"/></v></a></fp>)",
+          localFiles, true, std::make_unique<NamedFiles>(&tested));
+  EXPECT_THAT(tested,
+              ElementsAre("/mnt\\acme\\bin\\acme.exe", "\\\\fileserver\\apps\\acme\\bin\\acme.exe",
+                          "\\\\elsewhere\\apps\\bin\\acme.exe"));
+  EXPECT_EQ(Summary(results),
+            "c=localhost d=\\acme\\ a=1^1 v 1/1/1 c=fileserver d=\\acme\\ a=1^1 v 1/1/1 "
+            "c=elsewhere d=\\ a=1^1 v 1/1/1");
+}
+
+// Whole scenarios, drafting on and off.
+TEST_F(CompareMatchTest, VersionsAreFiledUnderEachFolderAndPrunedWhenAWeightedFileIsMissing) {
+  struct Case {
+    std::string fingerprint, localFiles, summary;
+  } cases[] = {
+      // Only files of weight above 0 (as a number, fractions too) make a version incomplete; the
+      // highest v_seq is taken over every version, found or not.
+      {"<a a_id='1'>" + Version("v_id='1' v_name='v1' v_seq='1'", "a.exe:1 x.dll:2") +
+           Version("v_id='2' v_name='v2' v_seq='2'", "a.exe:1 optional.dll:0") +
+           Version("v_id='3' v_name='v3' v_seq='5'", "never.exe:1") +
+           Version("v_id='4' v_name='v4' v_seq='1'", "a.exe:1 half.dll:0.5") + "</a><a a_id='2'>" +
+           Version("v_id='1' v_name='w' v_seq='1'", "a.exe:1 gone.dll:1") + "</a>",
+       LocalFiles({{"\\p\\", {"a.exe", "gone.dll"}}}), "c=localhost d=\\p\\ a=1^5 v2 1/2/1"},
+      // Every copy the pruning empties goes with its folder; the copy between them and the next
+      // application's copies stay.
+      {"<a a_id='1'>" + Version("v_id='1' v_name='v' v_seq='1'", "a.exe:1 x.dll:1") +
+           "</a><a a_id='2'>" + Version("v_id='1' v_name='t' v_seq='1'", "t.exe:1") + "</a>",
+       LocalFiles({{"\\one\\", {"a.exe"}},
+                   {"\\three\\", {"a.exe", "t.exe"}},
+                   {"\\two\\", {"a.exe", "x.dll"}}}),
+       "c=localhost d=\\two\\ a=1^1 v 2/2/2 d=\\three\\ a=2^1 t 1/1/1"},
+      // The only computer goes with its last drive; with another computer only the drive goes.
+      {"<a a_id='1'>" + Version("v_id='1' v_name='v' v_seq='1'", "a.exe:1 x.dll:1") + "</a>",
+       LocalFiles({{"\\p\\", {"a.exe"}}}), ""},
+      {"<a a_id='2'>" + Version("v_id='1' v_name='t' v_seq='1'", "t.exe:1") + "</a><a a_id='1'>" +
+           Version("v_id='1' v_name='v' v_seq='1'", "a.exe:1 x.dll:1") + "</a>",
+       "<trl_applicationdata>" + Computer("fileserver", "", "apps", {{"\\", {"t.exe"}}}) +
+           Computer("localhost", "c_local='1'", "", {{"\\p\\", {"a.exe"}}}) +
+           "</trl_applicationdata>",
+       "c=fileserver d=\\ a=2^1 t 1/1/1 c=localhost"},
+      // Without a v_id, no find reaches the copy an earlier one made.
+      {"<a a_id='1'>" + Version("v_name='v' v_seq='1'", "a.exe:0 b.dll:0") + "</a>",
+       LocalFiles({{"\\p\\", {"a.exe", "b.dll"}}}), "c=localhost d=\\p\\ a=1^1 v 1/2/0 v 1/2/0"},
+      // Nor an application copy, without an a_id.
+      {"<a>" + Version("v_id='1' v_name='v' v_seq='1'", "a.exe:0 b.dll:0") + "</a>",
+       LocalFiles({{"\\p\\", {"a.exe", "b.dll"}}}),
+       "c=localhost d=\\p\\ a=-^- v 1/2/0 a=-^- v 1/2/0"},
+      // A nested application with the same a_id files its version in the same copy, which its
+      // find completes.
+      {"<a a_id='1'>" + Version("v_id='1' v_name='outer' v_seq='1'", "a.exe:1 gone.dll:1") +
+           "<a a_id='1'><v v_id='1' v_name='inner' v_seq='1'>"
+           "<f f_id='2' f_name='b.dll' f_weight='1'/></v></a></a>",
+       LocalFiles({{"\\p\\", {"a.exe", "b.dll"}}}), "c=localhost d=\\p\\ a=1^1 outer 2/2/2"},
+  };
+  for (const Case& c : cases) {
+    for (bool draft : {true, false}) {
+      EXPECT_EQ(Summary(Run("<fp>" + c.fingerprint + "</fp>", c.localFiles, draft)), c.summary)
+          << c.fingerprint << (draft ? " drafted" : "");
+    }
+  }
 }
 
 }  // namespace
