@@ -45,6 +45,8 @@ TEST_F(CompareMatchTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
       {R"(<p p_type="4" p_weight="3" p_value="2024-05-06 07:08:10"/>)", "0", "0", {}},
       {R"(<p p_type="4" p_weight="3" p_value="soon"/>)", "0", "0", {"Type mismatch"}},
       {R"(<p p_type="5" p_weight="1" p_value="8"/>)", "0", "0", {"Unknown property type: 5"}},
+      // An unknown kind reads no expected value, so none need be there.
+      {R"(<p p_type="5" p_weight="1"/>)", "0", "0", {"Unknown property type: 5"}},
       {size + R"(<p p_type="2" p_weight="2" p_value="9"/>)" + time, "5", "0", {}},
       // The mask cannot hold both; nor can the file's p_max hold their sum.
       {R"(<p p_type="2" p_weight="15" p_value="8"/><p p_type="2" p_weight="15" p_value="8"/>)",
