@@ -58,6 +58,7 @@ TEST_F(SearchTest, RunRecordsWhatItsEntryAdmits) {
   auto applicationOptions = Parse("<o><a a_id='7' a_selected='0'/></o>");
   for (const auto& [options, expected] : cases)
     EXPECT_EQ(Summary(*Run(options, fingerprint, applicationOptions), root), expected) << options;
+  EXPECT_EQ(ValuesOf(*Run(walk("")), "//d", "d_id"), Words("1 2 3 4 5"));  // numbered from 1
 }
 
 // A report as its status or its path below `below`, then the counts of folders and files.
@@ -78,30 +79,29 @@ TEST_F(SearchTest, AsynchronousRunReportsEachFolderAndStopsAtTheNextCheck) {
   tree_.AddFolder("a/b");
   for (const char* file : {"f0", "a/f1", "a/b/f2"}) tree_.AddFile(file);
   Search search(fs::CreatePosixFileSystem({}));
-  std::string reports;
-  bool posted = false;
-  xml::DocumentPtr results;
-  search.OnStatusUpdate([&](const std::string& update, const std::string& text) {
-    reports += Noted(update, "e_status", tree_.Path());
-    results = Parse(text);
-  });
-  search.OnProgressUpdate([&](const std::string& update) {
-    reports += Noted(update, "e_d_name", tree_.Path());
-    if (!posted && reports.ends_with(R"(\a\ 1 1|)")) return search.Cancel();
-    if (posted && reports.ends_with(R"(|\ 0 0|)")) {
-      EventLoop::Current().Post([&] { EventLoop::Current().Post([&] { search.Cancel(); }); });
-    }
-  });
-  for (const char* expected : {R"(1 0 0|2 0 0|\\far\c\ 0 0|\ 0 0|\a\ 1 1|255 1 1|)",
-                               R"(1 0 0|2 0 0|\\far\c\ 0 0|\ 0 0|255 0 1|)"}) {
-    reports.clear();
-    results = Parse(R"(<r><c c_id="2"><m m_id="3"><d d_id="12"/><d d_id="7"/></m></c></r>)");
+  const std::string expected[] = {R"(1 0 0|2 0 0|\\far\c\ 0 0|\ 0 0|\a\ 1 1|255 1 1|)",
+                                  R"(1 0 0|2 0 0|\\far\c\ 0 0|\ 0 0|255 0 1|)"};
+  for (bool posted : {false, true}) {
+    std::string reports;
+    xml::DocumentPtr results =
+        Parse(R"(<r><c c_id="2"><m m_id="3"><d d_id="12"/><d d_id="7"/></m></c></r>)");
+    search.OnStatusUpdate([&](const std::string& update, const std::string& text) {
+      reports += Noted(update, "e_status", tree_.Path());
+      results = Parse(text);
+    });
+    search.OnProgressUpdate([&](const std::string& update) {
+      reports += Noted(update, "e_d_name", tree_.Path());
+      if (!posted && reports.ends_with(R"(\a\ 1 1|)")) return search.Cancel();
+      if (posted && reports.ends_with(R"(|\ 0 0|)")) {
+        EventLoop::Current().Post([&] { EventLoop::Current().Post([&] { search.Cancel(); }); });
+      }
+    });
     search.Start(Parse("<o>" + Computer("far", "c", "\\") +
                        Computer("localhost", "", tree_.Path()) + "</o>"),
                  nullptr, nullptr, results);
     ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return search.Status() >= kStatusComplete; },
                                               std::chrono::seconds(10)));
-    EXPECT_EQ(reports, expected);
+    EXPECT_EQ(reports, expected[posted]);
     EXPECT_EQ(Summary(*results, tree_.Path()), R"(|\ f0|-2147201303)");  // kept folders: no text
     EXPECT_THAT(
         results->Xml(),
@@ -109,7 +109,6 @@ TEST_F(SearchTest, AsynchronousRunReportsEachFolderAndStopsAtTheNextCheck) {
             "^<r search_start=\"[-0-9]{10} [:0-9]{8}\" search_end=\"[-0-9]{10} [:0-9]{8}\" "
             "cancelled=\"1\"><c c_id=\"4\"[^>]*><m m_id=\"5\"[^>]*><d d_id=\"13\".*<c "
             "c_id=\"3\" c_text=\"far\" c_name=\"far\"><m m_id=\"4\" m_text=\"c\" m_name=\"c\"/>"));
-    posted = true;
   }
 }
 
