@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -22,9 +23,14 @@ inline std::string Version(std::string_view text, std::string_view children = ""
   return "<v " + attributes + ">" + std::string(children) + "</v>";
 }
 
-inline std::string Application(std::string_view name, const std::vector<std::string>& versions) {
+// An application holding `versions`, each a Version text or raw XML, separated by '|'.
+inline std::string Application(std::string_view name, std::string_view versions = "") {
   std::string text = "<a a_id=\"1\" a_name=\"" + std::string(name) + "\">";
-  for (const std::string& v : versions) text += v;
+  while (!versions.empty()) {
+    std::string_view v = versions.substr(0, versions.find('|'));
+    text += v.front() == '<' ? std::string(v) : Version(v);
+    versions.remove_prefix(std::min(versions.size(), v.size() + 1));
+  }
   return text + "</a>";
 }
 
