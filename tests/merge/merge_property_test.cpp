@@ -64,9 +64,9 @@ std::string Names(const Key& key) {
 }
 
 // Results text with the applications grouped by place; only places with applications appear.
-std::string ResultsXml(const std::vector<App>& apps, const std::string& root) {
+std::string ResultsXml(const std::map<Key, App>& apps, const std::string& root) {
   std::map<int, std::map<int, std::map<int, std::string>>> tree;
-  for (const App& app : apps) tree[app.key[0]][app.key[1]][app.key[2]] += AppXml(app);
+  for (const auto& [key, app] : apps) tree[key[0]][key[1]][key[2]] += AppXml(app);
   std::string body;
   int ids = 0;
   for (const auto& [c, drives] : tree) {
@@ -95,9 +95,9 @@ std::string Content(const xml::Node& a) {
 }
 
 struct Run {
-  std::vector<App> old, fresh;
-  std::set<Key> managed;   // places and ids the search options manage
-  std::set<int> rejected;  // a_ids the application options reject
+  std::map<Key, App> old, fresh;  // by place and id
+  std::set<Key> managed;          // places and ids the search options manage
+  std::set<int> rejected;         // a_ids the application options reject
   Flag rootUpdate, rootDupes;
   int computers = 1;
 };
@@ -108,30 +108,29 @@ Run Generate(uint32_t trial) {
   run.computers = 1 + g.Below(2);
   run.rootUpdate = g.Pick(50);
   run.rootDupes = g.Pick(50);
-  std::set<Key> oldKeys, newKeys;
   for (int i = 0, n = 1 + g.Below(10); i < n; ++i) {
     App app;
     app.key = g.AnyPlace(run.computers, 1 + g.Below(6));
-    if (!oldKeys.insert(app.key).second) continue;
+    if (run.old.count(app.key)) continue;
     if (int kind = g.Below(6); kind > 0) app.vId = kind == 1 ? -1 : kind - 1;
     app.manage = g.Pick(70);
     app.update = g.Pick(40);
     app.dupes = g.Pick(40);
     for (int h = g.Below(3); h > 0; --h) app.history.push_back(1 + g.Below(9));
     app.firstVersion = app.vId && *app.vId > 0 ? *app.vId : 1 + g.Below(5);
-    run.old.push_back(app);
+    run.old[app.key] = app;
     if (g.Chance(50)) run.managed.insert(app.key);
   }
   auto addNew = [&](App app) {
-    if (!newKeys.insert(app.key).second) return;
+    if (run.fresh.count(app.key)) return;
     app.manage = g.Pick(30);
     app.update = g.Pick(20);
     app.dupes = g.Pick(20);
     app.history.clear();
     app.firstVersion = app.vId && *app.vId > 0 ? *app.vId : 1;
-    run.fresh.push_back(app);
+    run.fresh[app.key] = app;
   };
-  for (const App& old : run.old) {
+  for (const auto& [key, old] : run.old) {
     App next = old;
     int change = g.Below(6);
     if (change == 5) continue;                                              // gone
@@ -194,22 +193,19 @@ void CheckRun(uint32_t trial, Seen& seen) {
   auto old = Parse(ResultsXml(run.old, root));
   auto fresh = Parse(ResultsXml(run.fresh, ""));
   std::map<Key, std::string> before;
-  for (const App& app : run.old) before[app.key] = Content(At(*old, app));
+  for (const auto& [key, app] : run.old) before[key] = Content(At(*old, app));
 
   ASSERT_TRUE(MergeNow(Parse(SearchOptions(run, g)), Parse(ApplicationOptions(run)), old, fresh)
                   .events.empty());
   EXPECT_EQ(fresh->AsNode().CountNodes("//a"), 0u);
 
-  std::map<Key, const App*> freshAt;
-  for (const App& app : run.fresh) freshAt[app.key] = &app;
   std::multiset<std::string> missing;
   size_t kept = 0;
-  for (const App& o : run.old) {
-    const Key& key = o.key;
+  for (const auto& [key, o] : run.old) {
     xml::Node now = At(*old, o);
-    if (auto n = freshAt.find(key); n != freshAt.end()) {
+    if (auto n = run.fresh.find(key); n != run.fresh.end()) {
       ASSERT_TRUE(now) << "replaced " << key[3];
-      const App& fresher = *n->second;
+      const App& fresher = n->second;
       EXPECT_EQ(now.GetAttribute("v_id"), N(*fresher.vId));
       EXPECT_EQ(now.GetAttribute("a_manage"), o.manage.value_or("1"));
       int oldId = o.vId.value_or(0);
@@ -239,7 +235,7 @@ void CheckRun(uint32_t trial, Seen& seen) {
       ++seen.kept;
     }
   }
-  for (const App& n : run.fresh) {
+  for (const auto& [key, n] : run.fresh) {
     xml::Node now = At(*old, n);
     ASSERT_TRUE(now) << "new " << n.key[3];
     EXPECT_EQ(now.SelectSingleNode("v").GetAttribute("v_id"), N(n.firstVersion));
