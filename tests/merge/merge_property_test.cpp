@@ -7,6 +7,7 @@
 #include <map>
 #include <optional>
 #include <random>
+#include <regex>
 #include <set>
 #include <string>
 #include <vector>
@@ -18,6 +19,8 @@ namespace {
 
 using Key = std::array<int, 4>;  // computer, drive, folder and a_id
 using Flag = std::optional<std::string>;
+
+const std::regex kStamp(R"(\d{4}-\d\d-\d\d \d\d:\d\d:\d\d)");
 
 std::string N(int value) { return std::to_string(value); }
 std::string Drive(int m) { return std::string(1, 'c' + m) + ":"; }
@@ -49,7 +52,8 @@ std::string AppXml(const App& app) {
   std::string text = "<a a_id='" + N(app.key[3]) + "' a_name='N" + N(app.key[3]) + "'" +
                      Attr("v_id", app.vId ? Flag(N(*app.vId)) : std::nullopt) +
                      Attr("a_manage", app.manage) + Attr("a_update_q", app.update) +
-                     Attr("a_dupes_q", app.dupes) + "><v v_id='" + N(app.firstVersion) + "'/>";
+                     Attr("a_dupes_q", app.dupes) + "><v v_id='" + N(app.firstVersion) +
+                     "' v_name='V" + N(app.firstVersion) + "'><f f_id='1'/></v>";
   if (!app.history.empty()) {
     text += "<v_history>";
     for (int v : app.history) text += "<v v_id='" + N(v) + "'/>";
@@ -222,7 +226,17 @@ void CheckRun(uint32_t trial, Seen& seen) {
         actual.push_back(*v.GetAttribute("v_id"));
       EXPECT_EQ(actual, history) << "history of " << key[3];
       ++seen.replaced;
-      if (actual.size() > o.history.size()) ++seen.changed;
+      if (actual.size() > o.history.size()) {
+        // The entry added is a shallow copy of the old first version, stamped now.
+        ++seen.changed;
+        std::string entry;
+        for (const auto& [name, value] : now.SelectNodes("v_history/v").back().Attributes())
+          entry += name + "=" +
+                   (name == "v_updated" && std::regex_match(value, kStamp) ? "" : value) + ";";
+        EXPECT_EQ(entry, "v_id=" + actual.back() + ";v_name=V" + actual.back() +
+                             ";v_updated=;v_update_q=1;");
+        EXPECT_TRUE(now.SelectNodes("v_history/v").back().ChildNodes().empty());
+      }
     } else if (run.managed.count(key) && !run.rejected.count(key[3])) {
       EXPECT_FALSE(now) << "missing " << key[3];
       missing.insert(N(key[3]));
