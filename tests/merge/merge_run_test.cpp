@@ -16,11 +16,6 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using namespace std::chrono_literals;
 
-std::string App(std::string_view id) {
-  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
-         "' v_id='1'><v v_id='1'/></a>";
-}
-
 TEST(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
   struct Case {
     std::string oldBody;
@@ -28,8 +23,9 @@ TEST(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
   } cases[] = {
       {"", "1 1 1"},
       // After the highest ids wherever they stand.
-      {Place("A", "C:", "\\X\\", App("1"), "3 4 6") + Place("B", "C:", "\\X\\", App("1"), "9 2 8") +
-           Place("C", "C:", "\\X\\", App("1"), "5 7 1"),
+      {Place("A", "C:", "\\X\\", Application("1"), "3 4 6") +
+           Place("B", "C:", "\\X\\", Application("1"), "9 2 8") +
+           Place("C", "C:", "\\X\\", Application("1"), "5 7 1"),
        "10 8 9"},
       // The first attribute is the id, whatever its name.
       {"<c c_no='6' c_text='A' c_name='a'><m m_no='3' m_text='C:' m_name='c:'>"
@@ -40,7 +36,7 @@ TEST(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
     SCOPED_TRACE(c.added);
     auto old = Parse(Results(c.oldBody));
     auto run = MergeNow(Parse("<o/>"), nullptr, old,
-                        Parse(Results(Place("New", "E:", "\\Y\\", App("2")))));
+                        Parse(Results(Place("New", "E:", "\\Y\\", Application("2")))));
     for (const ReportedEvent& event : run.events) EXPECT_NE(event.className, "Merge");
     auto d = old->AsNode().SelectSingleNode("//c[@c_name='new']/m/d");
     ASSERT_TRUE(d);
@@ -93,9 +89,9 @@ class MergeRunTest : public ::testing::Test {
 };
 
 TEST_F(MergeRunTest, ReportsTheMissingThenEachMergedApplication) {
-  auto old = Parse(Results(Place("Host", "C:", "\\App\\", App("7") + App("8")) +
+  auto old = Parse(Results(Place("Host", "C:", "\\App\\", Application("7") + Application("8")) +
                            "<a_missing><a a_id='3'/></a_missing>"));
-  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", App("8") + App("9"))));
+  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", Application("8") + Application("9"))));
   std::vector<std::string> progress;
   onProgress_ = [&](const std::string&) { progress.push_back(All()); };
   RunToEnd(Parse("<o>" + Managed("host", "c:", "\\app\\", "7") + "</o>"), old, fresh);
@@ -124,8 +120,8 @@ TEST_F(MergeRunTest, TheNameIsReadOnlyForTheProgressOfAnAsynchronousRun) {
 
 TEST_F(MergeRunTest, CancelCompletesTheApplicationInProgressAndLeavesTheRest) {
   auto old = Parse(Results(""));
-  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", App("1") + App("2")) +
-                             Place("Host", "D:", "\\App\\", App("3"), "1 2 2")));
+  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", Application("1") + Application("2")) +
+                             Place("Host", "D:", "\\App\\", Application("3"), "1 2 2")));
   onProgress_ = [&](const std::string& event) {
     if (event == "PApp1") merge_.Cancel();
   };

@@ -8,10 +8,7 @@
 namespace trl::testing {
 namespace {
 
-std::string App(std::string_view id) {
-  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
-         "' a_manage='1' v_id='1'><v v_id='1'/></a>";
-}
+std::string App(std::string_view id) { return Application(id, " a_manage='1'"); }
 
 std::string At(std::string_view id) { return Managed("host", "c:", "\\app\\", id); }
 
@@ -59,32 +56,27 @@ const Case kCases[] = {
      "missing(3 7 8)"},
 };
 
-void PrintTo(const Case& c, std::ostream* os) { *os << c.name; }
-
-class MissingApplicationsTest : public ::testing::TestWithParam<Case> {};
-
-TEST_P(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
-  const Case& c = GetParam();
-  auto old = Parse(Results(c.oldResults));
-  auto run =
-      MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
-               Parse(std::string("<options>") + c.applicationOptions + "</options>"), old, nullptr);
-  std::vector<ReportedEvent> failures;
-  for (ReportedEvent event : run.events) {
-    event.description = event.source = "";
-    failures.push_back(event);
-  }
-  EXPECT_EQ(failures, c.failures);
-  EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
-  for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
-    EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
-    EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
-    EXPECT_TRUE(copy.ChildNodes().empty()) << "copies are shallow";
+TEST(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
+  for (const Case& c : kCases) {
+    SCOPED_TRACE(c.name);
+    auto old = Parse(Results(c.oldResults));
+    auto run = MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
+                        Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
+                        nullptr);
+    std::vector<ReportedEvent> failures;
+    for (ReportedEvent event : run.events) {
+      event.description = event.source = "";
+      failures.push_back(event);
+    }
+    EXPECT_EQ(failures, c.failures);
+    EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
+    for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
+      EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
+      EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
+      EXPECT_TRUE(copy.ChildNodes().empty()) << "copies are shallow";
+    }
   }
 }
-
-INSTANTIATE_TEST_SUITE_P(Cases, MissingApplicationsTest, ::testing::ValuesIn(kCases),
-                         [](const auto& info) { return std::string(info.param.name); });
 
 }  // namespace
 }  // namespace trl::testing
