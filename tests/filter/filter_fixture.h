@@ -13,12 +13,14 @@
 
 namespace trl::testing {
 
-// A version as a compare writes it, from "v_id v_act v_max f_act f_max"; v_name is "V" + v_id.
-inline std::string Version(std::string_view text, std::string_view children = "") {
+// A version as a compare writes it, from "v_id v_act v_max f_act f_max"; v_name is "V" + v_id;
+// `extra` attributes follow them.
+inline std::string Version(std::string_view text, std::string_view children = "",
+                           std::string_view extra = "") {
   auto w = Words(text);
   std::string attributes = "v_id=\"" + w[0] + "\" v_name=\"V" + w[0] + "\" v_seq=\"" + w[0] +
                            "\" v_max=\"" + w[2] + "\" v_act=\"" + w[1] + "\" f_max=\"" + w[4] +
-                           "\" f_act=\"" + w[3] + "\"";
+                           "\" f_act=\"" + w[3] + "\"" + std::string(extra);
   if (children.empty()) return "<v " + attributes + "/>";
   return "<v " + attributes + ">" + std::string(children) + "</v>";
 }

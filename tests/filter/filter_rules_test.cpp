@@ -71,28 +71,26 @@ TEST_F(FilterRulesTest, RulesKeepAndLabelVersionsAndTheApplicationTakesTheVerdic
 
 TEST_F(FilterRulesTest, TheOnlyVersionLeftHandsItsNotesToTheApplication) {
   const std::string kNotes = R"(<f f_id="1"/><n k="1"/><o k="2"/><n k="3"/>)";
+  const std::string kHanded = R"(<n k="1"/><n k="3"/><o k="2"/>)";
   const std::string kHead = R"(<a a_id="1" a_name="A" a_manage="1" )";
-  const std::string kTail = R"( v_max="3" v_act="3" f_max="1" f_act="1" v_weight="1">)";
+  const std::string kFile = R"(<f f_id="1"/>)", kNote = R"(<n k="0"/>)", kOne = R"( v_weight="1")";
   struct Case {
     int16_t options;
     std::string versions;
     std::string application;
   } cases[] = {
       {None, Version("3 3 3 1 1", kNotes),
-       kHead + R"(v_id="3" v_name="V3" v_seq="3"><n k="1"/><n k="3"/><o k="2"/>)" +
-           R"(<v v_id="3" v_name="V3" v_seq="3")" + kTail + R"(<f f_id="1"/></v></a>)"},
-      {LowWeights, Version("1 1 3 1 1", R"(<n k="0"/>)") + "|" + Version("2 3 3 1 1", kNotes),
-       kHead + R"(v_id="2" v_name="V2" v_seq="2"><n k="1"/><n k="3"/><o k="2"/>)" +
-           R"(<v v_id="2" v_name="V2" v_seq="2")" + kTail + R"(<f f_id="1"/></v></a>)"},
-      {None, Version("1 3 3 1 1", R"(<n k="0"/>)") + "|2 1 3 1 1",
+       kHead + R"(v_id="3" v_name="V3" v_seq="3">)" + kHanded + Version("3 3 3 1 1", kFile, kOne)},
+      {LowWeights, Version("1 1 3 1 1", kNote) + "|" + Version("2 3 3 1 1", kNotes),
+       kHead + R"(v_id="2" v_name="V2" v_seq="2">)" + kHanded + Version("2 3 3 1 1", kFile, kOne)},
+      {None, Version("1 3 3 1 1", kNote) + "|2 1 3 1 1",
        kHead + R"(v_id="-1" v_name="Unsupported Version" v_seq="-1">)" +
-           R"(<v v_id="1" v_name="V1" v_seq="1")" + kTail + R"(<n k="0"/></v><v v_id="2" )" +
-           R"(v_name="V2" v_seq="2" v_max="3" v_act="1" f_max="1" f_act="1" )" +
-           R"(v_weight="0.333333333333333"/></a>)"},
+           Version("1 3 3 1 1", kNote, kOne) +
+           Version("2 1 3 1 1", "", R"( v_weight="0.333333333333333")")},
   };
   for (const Case& c : cases) {
     auto document = Run(c.options, Matches({Application("A", c.versions)}));
-    EXPECT_EQ(document->AsNode().SelectSingleNode("//a").Xml(), c.application);
+    EXPECT_EQ(document->AsNode().SelectSingleNode("//a").Xml(), c.application + "</a>");
   }
 }
 
