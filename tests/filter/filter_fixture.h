@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -12,19 +13,26 @@
 
 namespace trl::testing {
 
-// A version as a compare writes it, from "v_id v_act v_max f_act f_max"; v_name is "V" + v_id.
-inline std::string Version(std::string_view text, std::string_view children = "") {
+// A version as a compare writes it, from "v_id v_act v_max f_act f_max"; v_name is "V" + v_id;
+// `extra` attributes follow them.
+inline std::string Version(std::string_view text, std::string_view children = "",
+                           std::string_view extra = "") {
   auto w = Words(text);
   std::string attributes = "v_id=\"" + w[0] + "\" v_name=\"V" + w[0] + "\" v_seq=\"" + w[0] +
                            "\" v_max=\"" + w[2] + "\" v_act=\"" + w[1] + "\" f_max=\"" + w[4] +
-                           "\" f_act=\"" + w[3] + "\"";
+                           "\" f_act=\"" + w[3] + "\"" + std::string(extra);
   if (children.empty()) return "<v " + attributes + "/>";
   return "<v " + attributes + ">" + std::string(children) + "</v>";
 }
 
-inline std::string Application(std::string_view name, const std::vector<std::string>& versions) {
+// An application holding `versions`, each a Version text or raw XML, separated by '|'.
+inline std::string Application(std::string_view name, std::string_view versions = "") {
   std::string text = "<a a_id=\"1\" a_name=\"" + std::string(name) + "\">";
-  for (const std::string& v : versions) text += v;
+  while (!versions.empty()) {
+    std::string_view v = versions.substr(0, versions.find('|'));
+    text += v.front() == '<' ? std::string(v) : Version(v);
+    versions.remove_prefix(std::min(versions.size(), v.size() + 1));
+  }
   return text + "</a>";
 }
 

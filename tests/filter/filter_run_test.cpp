@@ -55,12 +55,12 @@ class FilterRunTest : public FilterTest {
   std::string cancelAt_;
 };
 
-const std::string kOutside = Application("Outside", {Version("5 1 2 1 1"), Version("6 1 2 1 1")});
+const std::string kOutside = Application("Outside", "5 1 2 1 1|6 1 2 1 1");
 
 std::string ThreeApplications() {
-  return Matches({Application("A", {Version("1 3 3 1 1"), Version("2 1 3 1 1")}),
-                  Application("B", {}), Application("C", {Version("3 3 3 1 1")})},
-                 kOutside);
+  return Matches(
+      {Application("A", "1 3 3 1 1|2 1 3 1 1"), Application("B"), Application("C", "3 3 3 1 1")},
+      kOutside);
 }
 
 TEST_F(FilterRunTest, ReportsEachApplicationLeftWithAVersionAndCountsEveryApplication) {

@@ -23,6 +23,12 @@ inline std::string Place(std::string_view computer, std::string_view drive, std:
          std::string(applications) + "</d></m></c>";
 }
 
+// An application with one version; `extra` attributes follow its name.
+inline std::string Application(std::string_view id, std::string_view extra = "") {
+  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) + "'" +
+         std::string(extra) + " v_id='1'><v v_id='1'/></a>";
+}
+
 inline std::string Results(std::string_view body, std::string_view rootAttributes = "") {
   return "<trl_applicationdata " + std::string(rootAttributes) + ">" + std::string(body) +
          "</trl_applicationdata>";
@@ -44,17 +50,13 @@ inline std::string Shape(const xml::Node& node) {
   for (const xml::Node& child : node.ChildNodes()) {
     if (child.Type() != xml::NodeType::kElement) continue;
     std::string tag = child.NodeName();
-    std::string text;
-    if (tag == "a_missing") {
-      text = "missing";
-    } else if (tag == "c" || tag == "m" || tag == "d" || tag == "a") {
-      text = tag + child.GetAttribute(tag + "_id").value_or("?");
-    } else {
-      text = tag;
+    std::string text = tag == "a_missing" ? "missing" : tag;
+    if (node.NodeName() == "a_missing") {
+      text = child.GetAttribute("a_id").value_or("?");
+    } else if (tag.size() == 1 && std::string_view("cmda").find(tag) != std::string_view::npos) {
+      text += child.GetAttribute(tag + "_id").value_or("?");
     }
     if (tag != "a") text += "(" + Shape(child) + ")";
-    if (tag == "a" && node.NodeName() == "a_missing")
-      text = child.GetAttribute("a_id").value_or("?");
     out += (out.empty() ? "" : " ") + text;
   }
   return out;

@@ -16,78 +16,63 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using namespace std::chrono_literals;
 
-std::string App(std::string_view id) {
-  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
-         "' v_id='1'><v v_id='1'/></a>";
+TEST(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
+  struct Case {
+    std::string oldBody;
+    const char* added;  // c_id m_id d_id of the place the merge adds
+  } cases[] = {
+      {"", "1 1 1"},
+      // After the highest ids wherever they stand.
+      {Place("A", "C:", "\\X\\", Application("1"), "3 4 6") +
+           Place("B", "C:", "\\X\\", Application("1"), "9 2 8") +
+           Place("C", "C:", "\\X\\", Application("1"), "5 7 1"),
+       "10 8 9"},
+      // The first attribute is the id, whatever its name.
+      {"<c c_no='6' c_text='A' c_name='a'><m m_no='3' m_text='C:' m_name='c:'>"
+       "<d d_no='8' d_text='\\X\\' d_name='\\x\\'/></m></c>",
+       "7 4 9"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.added);
+    auto old = Parse(Results(c.oldBody));
+    auto run = MergeNow(Parse("<o/>"), nullptr, old,
+                        Parse(Results(Place("New", "E:", "\\Y\\", Application("2")))));
+    for (const ReportedEvent& event : run.events) EXPECT_NE(event.className, "Merge");
+    auto d = old->AsNode().SelectSingleNode("//c[@c_name='new']/m/d");
+    ASSERT_TRUE(d);
+    EXPECT_EQ(*d.ParentNode().ParentNode().GetAttribute("c_id") + " " +
+                  *d.ParentNode().GetAttribute("m_id") + " " + *d.GetAttribute("d_id"),
+              c.added);
+  }
 }
 
-struct CounterCase {
-  const char* name;
-  std::string oldBody;
-  const char* added;  // c_id m_id d_id of the place the merge adds
-};
-
-const CounterCase kCounterCases[] = {
-    {"EmptyRootStartsAtOne", "", "1 1 1"},
-    {"AfterTheHighestIdsWhereverTheyStand",
-     Place("A", "C:", "\\X\\", App("1"), "3 4 6") + Place("B", "C:", "\\X\\", App("1"), "9 2 8") +
-         Place("C", "C:", "\\X\\", App("1"), "5 7 1"),
-     "10 8 9"},
-    {"TheFirstAttributeIsTheIdWhateverItsName",
-     "<c c_no='6' c_text='A' c_name='a'><m m_no='3' m_text='C:' m_name='c:'>"
-     "<d d_no='8' d_text='\\X\\' d_name='\\x\\'/></m></c>",
-     "7 4 9"},
-};
-
-class MergeCounterTest : public ::testing::TestWithParam<CounterCase> {};
-
-TEST_P(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
-  auto old = Parse(Results(GetParam().oldBody));
-  auto run =
-      MergeNow(Parse("<o/>"), nullptr, old, Parse(Results(Place("New", "E:", "\\Y\\", App("2")))));
-  for (const ReportedEvent& event : run.events) EXPECT_NE(event.className, "Merge");
-  auto c = old->AsNode().SelectSingleNode("//c[@c_name='new']");
-  ASSERT_TRUE(c);
-  auto m = c.SelectSingleNode("m");
-  auto d = m.SelectSingleNode("d");
-  EXPECT_EQ(*c.GetAttribute("c_id") + " " + *m.GetAttribute("m_id") + " " + *d.GetAttribute("d_id"),
-            GetParam().added);
-}
-
-INSTANTIATE_TEST_SUITE_P(Cases, MergeCounterTest, ::testing::ValuesIn(kCounterCases),
-                         [](const auto& info) { return std::string(info.param.name); });
-
-// What an asynchronous run reports: "S<status>" and "P<a_name>" in order.
-struct Recorder {
-  explicit Recorder(Merge& merge) {
-    merge.OnStatusUpdate([this](const std::string& update, const std::string& results) {
-      last = Parse(update);
-      events.push_back("S" + Attribute("e_status"));
-      lastResults = results;
-    });
-    merge.OnProgressUpdate([this](const std::string& update) {
-      last = Parse(update);
-      events.push_back("P" + Attribute("a_name"));
-      if (onProgress) onProgress(events.back());
-    });
-  }
-  std::string Attribute(std::string_view name) const {
-    return last->DocumentElement().GetAttribute(name).value_or("<absent>");
-  }
-  std::vector<std::string> Names() const {
-    std::vector<std::string> names;
-    for (const auto& [name, value] : last->DocumentElement().Attributes()) names.push_back(name);
-    return names;
-  }
-
-  std::vector<std::string> events;
-  xml::DocumentPtr last;
-  std::string lastResults;
-  std::function<void(const std::string&)> onProgress;
-};
-
+// Records what an asynchronous run reports: "S<status>" and "P<a_name>" in order.
 class MergeRunTest : public ::testing::Test {
  protected:
+  MergeRunTest() {
+    merge_.OnStatusUpdate([this](const std::string& update, const std::string& results) {
+      last_ = Parse(update);
+      events_.push_back("S" + Attribute("e_status"));
+      lastResults_ = results;
+    });
+    merge_.OnProgressUpdate([this](const std::string& update) {
+      last_ = Parse(update);
+      events_.push_back("P" + Attribute("a_name"));
+      if (onProgress_) onProgress_(events_.back());
+    });
+  }
+
+  std::string Attribute(std::string_view name) const {
+    return last_->DocumentElement().GetAttribute(name).value_or("<absent>");
+  }
+  // Every attribute of the last report, as "name=value" in order.
+  std::string All() const {
+    std::string text;
+    for (const auto& [name, value] : last_->DocumentElement().Attributes())
+      text += (text.empty() ? "" : " ") + name + "=" + value;
+    return text;
+  }
+
   void RunToEnd(const xml::DocumentPtr& searchOptions, const xml::DocumentPtr& old,
                 const xml::DocumentPtr& fresh) {
     EXPECT_EQ(merge_.Start(searchOptions, nullptr, old, fresh), "");
@@ -97,39 +82,29 @@ class MergeRunTest : public ::testing::Test {
   }
 
   Merge merge_;
-  Recorder recorder_{merge_};
+  std::vector<std::string> events_;
+  xml::DocumentPtr last_;
+  std::string lastResults_;
+  std::function<void(const std::string&)> onProgress_;
 };
 
 TEST_F(MergeRunTest, ReportsTheMissingThenEachMergedApplication) {
-  auto old = Parse(Results(Place("Host", "C:", "\\App\\", App("7") + App("8")) +
+  auto old = Parse(Results(Place("Host", "C:", "\\App\\", Application("7") + Application("8")) +
                            "<a_missing><a a_id='3'/></a_missing>"));
-  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", App("8") + App("9"))));
+  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", Application("8") + Application("9"))));
   std::vector<std::string> progress;
-  recorder_.onProgress = [&](const std::string&) {
-    progress.push_back(recorder_.Attribute("e_match_merged") + "/" +
-                       recorder_.Attribute("e_match_missing"));
-  };
+  onProgress_ = [&](const std::string&) { progress.push_back(All()); };
   RunToEnd(Parse("<o>" + Managed("host", "c:", "\\app\\", "7") + "</o>"), old, fresh);
-  EXPECT_THAT(recorder_.events, ElementsAre("S1", "S2", "PApp7", "PApp8", "PApp9", "S3"));
-  EXPECT_THAT(progress, ElementsAre("0/1", "1/1", "2/1"));
-  EXPECT_THAT(recorder_.Names(),
-              ElementsAre("e_mode", "e_status", "e_match_total_new", "e_match_total_old",
-                          "e_match_merged", "e_match_missing"));
-  EXPECT_EQ(recorder_.Attribute("e_mode"), "4");
-  EXPECT_EQ(recorder_.Attribute("e_match_total_new"), "2");
-  EXPECT_EQ(recorder_.Attribute("e_match_total_old"), "3");  // the list's copy counts
-  EXPECT_EQ(Shape(Parse(recorder_.lastResults)->DocumentElement()),
-            "c1(m1(d1(a8 a9))) missing(3 7)");
+  EXPECT_THAT(events_, ElementsAre("S1", "S2", "PApp7", "PApp8", "PApp9", "S3"));
+  // The list's copy counts among the old; the progress names the application before the counters.
+  const std::string kCounts = "e_match_total_new=2 e_match_total_old=3 e_match_merged=";
+  EXPECT_THAT(progress,
+              ElementsAre("e_mode=4 e_status=2 a_name=App7 " + kCounts + "0 e_match_missing=1",
+                          "e_mode=4 e_status=2 a_name=App8 " + kCounts + "1 e_match_missing=1",
+                          "e_mode=4 e_status=2 a_name=App9 " + kCounts + "2 e_match_missing=1"));
+  EXPECT_EQ(All(), "e_mode=4 e_status=3 " + kCounts + "2 e_match_missing=1");
+  EXPECT_EQ(Shape(Parse(lastResults_)->DocumentElement()), "c1(m1(d1(a8 a9))) missing(3 7)");
   EXPECT_THAT(TakeReportedEvents(), IsEmpty());
-}
-
-TEST_F(MergeRunTest, ProgressCarriesTheApplicationNameBeforeTheCounters) {
-  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", App("8"))));
-  std::vector<std::string> names;
-  recorder_.onProgress = [&](const std::string&) { names = recorder_.Names(); };
-  RunToEnd(nullptr, Parse(Results("")), fresh);
-  EXPECT_THAT(names, ElementsAre("e_mode", "e_status", "a_name", "e_match_total_new",
-                                 "e_match_total_old", "e_match_merged", "e_match_missing"));
 }
 
 TEST_F(MergeRunTest, TheNameIsReadOnlyForTheProgressOfAnAsynchronousRun) {
@@ -145,13 +120,13 @@ TEST_F(MergeRunTest, TheNameIsReadOnlyForTheProgressOfAnAsynchronousRun) {
 
 TEST_F(MergeRunTest, CancelCompletesTheApplicationInProgressAndLeavesTheRest) {
   auto old = Parse(Results(""));
-  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", App("1") + App("2")) +
-                             Place("Host", "D:", "\\App\\", App("3"), "1 2 2")));
-  recorder_.onProgress = [&](const std::string& event) {
+  auto fresh = Parse(Results(Place("Host", "C:", "\\App\\", Application("1") + Application("2")) +
+                             Place("Host", "D:", "\\App\\", Application("3"), "1 2 2")));
+  onProgress_ = [&](const std::string& event) {
     if (event == "PApp1") merge_.Cancel();
   };
   RunToEnd(nullptr, old, fresh);
-  EXPECT_THAT(recorder_.events, ElementsAre("S1", "S2", "PApp1", "S255"));
+  EXPECT_THAT(events_, ElementsAre("S1", "S2", "PApp1", "S255"));
   EXPECT_EQ(merge_.Status(), kStatusCancelled);
   EXPECT_EQ(Shape(old->DocumentElement()), "c1(m1(d1(a1)))");
   EXPECT_THAT(ValuesOf(*old, "//a", "a_update_q"), ElementsAre("1"));

@@ -1,6 +1,5 @@
 // Managed applications no longer found at their place move to the missing list: the cases the
 // generated runs of merge_property_test do not make.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "merge/merge_fixture.h"
@@ -9,97 +8,74 @@
 namespace trl::testing {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
+std::string App(std::string_view id) { return Application(id, " a_manage='1'"); }
 
-std::string App(std::string_view id) {
-  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
-         "' a_manage='1' v_id='1'><v v_id='1'/></a>";
-}
+std::string At(std::string_view id) { return Managed("host", "c:", "\\app\\", id); }
 
 struct Case {
   const char* name;
   std::string searchOptions;  // the body under the options root
   std::string oldResults;     // the body under the results root
-  std::string newResults;
-  const char* applicationOptions;
-  const char* shape;  // of the old results afterwards
+  const char* shape;          // of the old results afterwards
+  const char* applicationOptions = "";
   std::vector<ReportedEvent> failures = {};
 };
 
 const std::string kHostC = Place("Host", "C:", "\\App\\", App("7"));
-const std::string kTwoApps = Place("Host", "C:", "\\App\\", App("7") + App("8"));
 
 const Case kCases[] = {
-    {"OnlyApplicationTakesTheComputerWithIt", Managed("host", "c:", "\\app\\", "7"), kHostC, "", "",
-     "missing(7)"},
-    {"AnOldIdWrittenWithZerosIsNotFound", Managed("host", "c:", "\\app\\", "7"),
-     Place("Host", "C:", "\\App\\", App("007")), "", "", "c1(m1(d1(a007)))"},
-    {"AnotherComputerKeepsTheEmptiedOneInPlace", Managed("host", "c:", "\\app\\", "7"),
-     kHostC + Place("Other", "C:", "\\App\\", App("9"), "2 2 2"), "", "",
-     "c1() c2(m2(d2(a9))) missing(7)"},
-    {"UnmanagedIsNotChecked", Managed("host", "c:", "\\app\\", "7", "true"), kHostC, "", "",
+    {"OnlyApplicationTakesTheComputerWithIt", At("7"), kHostC, "missing(7)"},
+    {"AnOldIdWrittenWithZerosIsNotFound", At("7"), Place("Host", "C:", "\\App\\", App("007")),
+     "c1(m1(d1(a007)))"},
+    {"AnotherComputerKeepsTheEmptiedOneInPlace", At("7"),
+     kHostC + Place("Other", "C:", "\\App\\", App("9"), "2 2 2"), "c1() c2(m2(d2(a9))) missing(7)"},
+    {"UnmanagedIsNotChecked", Managed("host", "c:", "\\app\\", "7", "true"), kHostC,
      "c1(m1(d1(a7)))"},
-    {"RejectedAsFoundInTheResultsIsNeverMoved", Managed("host", "c:", "\\app\\", "007"), kHostC, "",
-     "<a a_id='7' a_selected='0'/>", "c1(m1(d1(a7)))"},
-    {"APlaceNamedTwiceIsSearchedThroughout", Managed("host", "c:", "\\app\\", "7"),
+    {"RejectedAsFoundInTheResultsIsNeverMoved", At("007"), kHostC, "c1(m1(d1(a7)))",
+     "<a a_id='7' a_selected='0'/>"},
+    {"APlaceNamedTwiceIsSearchedThroughout", At("7"),
      Place("Host", "C:", "\\App\\", App("8")) + Place("Host", "C:", "\\App\\", App("7"), "2 2 2"),
-     "", "", "c1(m1(d1(a8))) c2() missing(7)"},
+     "c1(m1(d1(a8))) c2() missing(7)"},
     {"ANameWithAnApostropheIsTakenAsTheSelectionReadsIt",
-     Managed("nope&apos; or @c_name=&apos;host", "c:", "\\app\\", "7"), kHostC, "", "",
-     "missing(7)"},
-    {"DuplicateIdsInAFolderMoveTheFirstOnly", Managed("host", "c:", "\\app\\", "7"),
-     Place("Host", "C:", "\\App\\", App("7") + App("7")), "", "", "c1(m1(d1(a7))) missing(7)"},
+     Managed("nope&apos; or @c_name=&apos;host", "c:", "\\app\\", "7"), kHostC, "missing(7)"},
+    {"DuplicateIdsInAFolderMoveTheFirstOnly", At("7"),
+     Place("Host", "C:", "\\App\\", App("7") + App("7")), "c1(m1(d1(a7))) missing(7)"},
     // The computer cannot be taken from the root, which does not hold it: the drive still goes.
     {"EachEmptiedLevelIsRemovedOnItsOwn",
-     Managed("host", "c:", "\\app\\", "7"),
+     At("7"),
      "<x>" + kHostC + "</x>",
-     "",
-     "",
      "x(c1()) missing(7)",
+     "",
      {{kInvalidArgument, 1, "Merge", "MissingApplication", "", ""}}},
-    {"SecondMissingJoinsTheList",
-     Managed("host", "c:", "\\app\\", "7") + Managed("host", "c:", "\\app\\", "8"),
-     kTwoApps + "<a_missing><a a_id='3'/></a_missing>", "", "", "missing(3 7 8)"},
+    {"TheListIsMadeOnceAsTheRootsLastChild", At("7") + Managed("other", "c:", "\\app\\", "9"),
+     Place("Host", "C:", "\\App\\", App("7") + App("8")) +
+         Place("Other", "C:", "\\App\\", App("9"), "2 2 2"),
+     "c1(m1(d1(a8))) c2() missing(7 9)"},
+    {"SecondMissingJoinsTheList", At("7") + At("8"),
+     Place("Host", "C:", "\\App\\", App("7") + App("8")) + "<a_missing><a a_id='3'/></a_missing>",
+     "missing(3 7 8)"},
 };
 
-void PrintTo(const Case& c, std::ostream* os) { *os << c.name; }
-
-class MissingApplicationsTest : public ::testing::TestWithParam<Case> {};
-
-TEST_P(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
-  const Case& c = GetParam();
-  auto old = Parse(Results(c.oldResults));
-  auto run = MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
-                      Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
-                      Parse(Results(c.newResults)));
-  std::vector<ReportedEvent> failures;
-  for (ReportedEvent event : run.events) {
-    event.description = event.source = "";
-    failures.push_back(event);
+TEST(MissingApplicationsTest, MovesWhatIsGoneFromItsPlace) {
+  for (const Case& c : kCases) {
+    SCOPED_TRACE(c.name);
+    auto old = Parse(Results(c.oldResults));
+    auto run = MergeNow(Parse("<options>" + c.searchOptions + "</options>"),
+                        Parse(std::string("<options>") + c.applicationOptions + "</options>"), old,
+                        nullptr);
+    std::vector<ReportedEvent> failures;
+    for (ReportedEvent event : run.events) {
+      event.description = event.source = "";
+      failures.push_back(event);
+    }
+    EXPECT_EQ(failures, c.failures);
+    EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
+    for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
+      EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
+      EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
+      EXPECT_TRUE(copy.ChildNodes().empty()) << "copies are shallow";
+    }
   }
-  EXPECT_EQ(failures, c.failures);
-  EXPECT_EQ(Shape(old->DocumentElement()), c.shape);
-  for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a[@a_id!='3']")) {
-    EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
-    EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
-    EXPECT_TRUE(copy.ChildNodes().empty()) << "copies are shallow";
-  }
-}
-
-INSTANTIATE_TEST_SUITE_P(Cases, MissingApplicationsTest, ::testing::ValuesIn(kCases),
-                         [](const auto& info) { return std::string(info.param.name); });
-
-TEST(MissingListTest, IsMadeOnceAsTheRootsLastChild) {
-  auto old = Parse(Results(Place("Host", "C:", "\\App\\", App("7") + App("8")) +
-                           Place("Other", "C:", "\\App\\", App("9"), "2 2 2")));
-  MergeNow(Parse("<o>" + Managed("host", "c:", "\\app\\", "7") +
-                 Managed("other", "c:", "\\app\\", "9") + "</o>"),
-           nullptr, old, nullptr);
-  auto root = old->DocumentElement();
-  auto children = root.ChildNodes();
-  EXPECT_EQ(children.back().NodeName(), "a_missing");
-  EXPECT_EQ(Shape(root), "c1(m1(d1(a8))) c2() missing(7 9)");
 }
 
 }  // namespace
