@@ -45,6 +45,13 @@ inline std::string LocalFiles(const std::vector<LocalFolder>& folders) {
          Computer("localhost", "c_local='1'", "", folders) + "</trl_applicationdata>";
 }
 
+// The '|'-separated fields of a table row.
+inline std::vector<std::string> Fields(std::string_view row) {
+  std::vector<std::string> fields(1);
+  for (char c : row) c == '|' ? fields.emplace_back() : fields.back() += c;
+  return fields;
+}
+
 // A fingerprint version: `files` as "name:weight ...", numbered from 1.
 inline std::string Version(std::string_view attributes, std::string_view files) {
   std::string text = "<v " + std::string(attributes) + ">";

@@ -7,45 +7,26 @@
 namespace trl::testing {
 namespace {
 
-using ::testing::ElementsAre;
-
-using FindCommonPathTest = CompareTest;
-
-TEST_F(FindCommonPathTest, FolderFitsTheRelativePathOnlyAtABackslash) {
-  struct Case {
-    const char* relpath;  // nullptr: absent
-    const char* fullpath;
-    const char* folder;
-    const char* expected;
-  } cases[] = {
-      {"bin", nullptr, R"(\apps\acme\bin\)", R"(\apps\acme\)"},
-      {R"(\bin\)", nullptr, R"(\apps\acme\bin\)", R"(\apps\acme\)"},
-      {"BIN", nullptr, R"(\apps\acme\bin\)", R"(\apps\acme\)"},
-      {"", nullptr, R"(\apps\acme\bin\)", R"(\apps\acme\bin\)"},
-      {R"(\)", nullptr, R"(\apps\acme\bin\)", R"(\apps\acme\bin\)"},
-      {"data", nullptr, R"(\apps\acme\bin\)", ""},
-      {R"(lib\plugins)", nullptr, R"(\x\lib\plugins\)", R"(\x\)"},
-      {"bin", nullptr, R"(\x\bin)", R"(\x\)"},
-      {"bin", nullptr, R"(\bin\)", R"(\)"},
-      {"bin", nullptr, R"(\appsbin\)", ""},
-      {"bin", nullptr, "bin", ""},
-      {R"(\apps\acme\bin)", "True", R"(\apps\acme\bin\)", R"(\apps\acme\bin\)"},
-      {R"(\apps\acme)", "True", R"(\apps\acme\bin\)", ""},
-      {R"(\apps\acme\bin)", "true", R"(\apps\acme\bin\)", R"(\)"},
-      {nullptr, nullptr, R"(\apps\)", R"(\apps\)"},
-  };
-  for (const Case& c : cases) {
+TEST_F(CompareTest, FolderFitsTheRelativePathOnlyAtABackslash) {
+  // Rows "f_relpath|f_fullpath|folder|expected", an attribute left out where it is "-".
+  const char* const rows =
+      R"(bin|-|\apps\acme\bin\|\apps\acme\  \bin\|-|\apps\acme\bin\|\apps\acme\ )"
+      R"(BIN|-|\apps\acme\bin\|\apps\acme\  |-|\apps\acme\bin\|\apps\acme\bin\ )"
+      R"(\|-|\apps\acme\bin\|\apps\acme\bin\  data|-|\apps\acme\bin\|  bin|-|\x\bin|\x\ )"
+      R"(lib\plugins|-|\x\lib\plugins\|\x\  bin|-|\bin\|\  bin|-|\appsbin\|  bin|-|bin| )"
+      R"(\apps\acme\bin|True|\apps\acme\bin\|\apps\acme\bin\  -|-|\apps\|\apps\ )"
+      R"(\apps\acme|True|\apps\acme\bin\|  \apps\acme\bin|true|\apps\acme\bin\|\)";
+  for (const std::string& row : Words(rows)) {
+    std::vector<std::string> c = Fields(row);
     std::string f = "<f f_name='x'";
-    if (c.relpath) f += std::string(" f_relpath='") + c.relpath + "'";
-    if (c.fullpath) f += std::string(" f_fullpath='") + c.fullpath + "'";
-    auto document = Parse(f + "/>");
-    EXPECT_EQ(Compare::FindCommonPath(document->DocumentElement(), c.folder), c.expected)
-        << (c.relpath ? c.relpath : "(absent)") << " in " << c.folder;
+    if (c[0] != "-") f += " f_relpath='" + c[0] + "'";
+    if (c[1] != "-") f += " f_fullpath='" + c[1] + "'";
+    EXPECT_EQ(Compare::FindCommonPath(Parse(f + "/>")->DocumentElement(), c[2]), c[3]) << row;
   }
   // Only the file without f_relpath is reported.
   EXPECT_THAT(TakeReportedEvents(),
-              ElementsAre(ReportedEvent{94, 1, "Compare", "FindCommonPath", "Invalid use of Null",
-                                        "trlLocator"}));
+              ::testing::ElementsAre(ReportedEvent{94, 1, "Compare", "FindCommonPath",
+                                                   "Invalid use of Null", "trlLocator"}));
 }
 
 }  // namespace
