@@ -45,10 +45,11 @@ inline std::string LocalFiles(const std::vector<LocalFolder>& folders) {
          Computer("localhost", "c_local='1'", "", folders) + "</trl_applicationdata>";
 }
 
-// The '|'-separated fields of a table row.
-inline std::vector<std::string> Fields(std::string_view row) {
-  std::vector<std::string> fields(1);
-  for (char c : row) c == '|' ? fields.emplace_back() : fields.back() += c;
+// The fields of a table row; none in an empty one.
+inline std::vector<std::string> Fields(std::string_view row, char separator = '|') {
+  std::vector<std::string> fields;
+  if (!row.empty()) fields.emplace_back();
+  for (char c : row) c == separator ? fields.emplace_back() : fields.back() += c;
   return fields;
 }
 

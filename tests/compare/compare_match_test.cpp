@@ -18,51 +18,48 @@ std::vector<std::string> Events(const std::string& results) {
   return events;
 }
 
-std::string OneFileFingerprint(std::string_view properties) {
-  return R"(<fp><a a_id="1" a_name="A"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" )"
-         R"(f_name="data.bin" f_relpath="" f_weight="1">)" +
-         std::string(properties) + "</f></v></a></fp>";
+// A fingerprint file data.bin with properties "type/weight[/value];...".
+std::string OneFileFingerprint(const std::string& properties) {
+  std::string text = R"(<fp><a a_id="1" a_name="A"><v v_id="1" v_name="v" v_seq="1"><f f_id="1" )"
+                     R"(f_name="data.bin" f_relpath="" f_weight="1">)";
+  for (const std::string& property : Fields(properties, ';')) {
+    std::vector<std::string> p = Fields(property, '/');
+    text += "<p p_type='" + p[0] + "' p_weight='" + p[1] + "'" +
+            (p.size() > 2 ? " p_value='" + p[2] + "'/>" : "/>");
+  }
+  return text + "</f></v></a></fp>";
 }
 
-// data.bin holds "data.bin".
+// data.bin holds "data.bin". Rows "properties|p_act|v_act|events;...": the file's bit counts in
+// v_act only when every property agreed.
 TEST_F(CompareMatchTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
-  const std::string size = R"(<p p_type="2" p_weight="1" p_value="8"/>)";
-  const std::string time = R"(<p p_type="4" p_weight="3" p_value="2024-05-06 07:08:09"/>)";
-  struct Case {
-    std::string properties;
-    const char* mask;   // p_act
-    const char* score;  // v_act: the file's bit only when every property agreed
-    std::vector<std::string> events;
-  } cases[] = {
-      {size, "1", "1", {}},
-      {R"(<p p_type="2" p_weight="1" p_value="9"/>)", "0", "0", {}},
-      {R"(<p p_type="2" p_weight="1" p_value="eight"/>)", "0", "0", {"Type mismatch"}},
-      {R"(<p p_type="3" p_weight="2" p_value="1094B026F81945A54E2B8F965AEE37DA"/>)", "2", "1", {}},
-      {R"(<p p_type="3" p_weight="2" p_value="1094b026f81945a54e2b8f965aee37db"/>)", "0", "0", {}},
-      {R"(<p p_type="1" p_weight="1" p_value=""/>)", "1", "1", {}},
-      {R"(<p p_type="1" p_weight="1" p_value="1.0.0.0"/>)", "0", "0", {}},
-      {time, "4", "1", {}},
-      {R"(<p p_type="4" p_weight="3" p_value="2024-05-06 07:08:10"/>)", "0", "0", {}},
-      {R"(<p p_type="4" p_weight="3" p_value="soon"/>)", "0", "0", {"Type mismatch"}},
-      {R"(<p p_type="5" p_weight="1" p_value="8"/>)", "0", "0", {"Unknown property type: 5"}},
-      // An unknown kind reads no expected value, so none need be there.
-      {R"(<p p_type="5" p_weight="1"/>)", "0", "0", {"Unknown property type: 5"}},
-      {size + R"(<p p_type="2" p_weight="2" p_value="9"/>)" + time, "5", "0", {}},
+  const char* const rows[] = {
+      "2/1/8|1|1|",
+      "2/1/9|0|0|",
+      "2/1/eight|0|0|Type mismatch",
+      "3/2/1094B026F81945A54E2B8F965AEE37DA|2|1|",
+      "3/2/1094b026f81945a54e2b8f965aee37db|0|0|",
+      "1/1/|1|1|",
+      "1/1/1.0.0.0|0|0|",
+      "4/3/2024-05-06 07:08:09|4|1|",
+      "4/3/2024-05-06 07:08:10|0|0|",
+      "4/3/soon|0|0|Type mismatch",
+      "5/1/8|0|0|Unknown property type: 5",
+      "5/1|0|0|Unknown property type: 5",  // an unknown kind reads no expected value
+      "2/1/8;2/2/9;4/3/2024-05-06 07:08:09|5|0|",
       // The mask cannot hold both; nor can the file's p_max hold their sum.
-      {R"(<p p_type="2" p_weight="15" p_value="8"/><p p_type="2" p_weight="15" p_value="8"/>)",
-       "16384",
-       "0",
-       {"Overflow", "Overflow"}},
-      {"", "0", "1", {}},
+      "2/15/8;2/15/8|16384|0|Overflow;Overflow",
+      "|0|1|",
       // A weight that cannot be read is reported by the upgrade and again at each test.
-      {R"(<p p_type="2" p_weight="x" p_value="8"/>)", "0", "1", {"Type mismatch", "Type mismatch"}},
+      "2/x/8|0|1|Type mismatch;Type mismatch",
   };
-  for (const Case& c : cases) {
-    auto results = Run(OneFileFingerprint(c.properties), LocalFiles({{"\\", {"data.bin"}}}));
-    SCOPED_TRACE(c.properties);
-    EXPECT_THAT(ValuesOf(*Parse(results), "//a/v/f", "p_act"), ElementsAre(c.mask));
-    EXPECT_EQ(Summary(results), std::string("c=localhost d=\\ a=1^1 v 1/1/") + c.score);
-    EXPECT_EQ(Events(results), c.events);
+  for (const char* row : rows) {
+    std::vector<std::string> c = Fields(row);
+    auto results = Run(OneFileFingerprint(c[0]), LocalFiles({{"\\", {"data.bin"}}}));
+    SCOPED_TRACE(row);
+    EXPECT_THAT(ValuesOf(*Parse(results), "//a/v/f", "p_act"), ElementsAre(c[1]));
+    EXPECT_EQ(Summary(results), "c=localhost d=\\ a=1^1 v 1/1/" + c[2]);
+    EXPECT_EQ(Events(results), Fields(c[3], ';'));
   }
 }
 
