@@ -1,5 +1,7 @@
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <csignal>
 #include <filesystem>
 #include <map>
 #include <string>
@@ -14,6 +16,7 @@
 #include "frame/error_handler.h"
 #include "locate_command.h"
 #include "merge_command.h"
+#include "platform/event_loop.h"
 #include "search_command.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
@@ -22,12 +25,16 @@
 namespace trl::cli {
 namespace {
 
+using ::testing::ContainsRegex;
+using ::testing::HasSubstr;
+
 // A tree with inputs for each command. Command lines name its files as "@name".
 class CommandsTest : public ::testing::Test {
  protected:
   void SetUp() override {
     tree_.AddFolder("App");
     tree_.AddFile("App/Main.exe", "x");
+    tree_.AddFile("App/tool.exe", "one");
     tree_.AddFile("search.xml",
                   "<o><c c_id='1' c_text='localhost' c_name='localhost' c_local='1'>"
                   "<m m_id='1' m_text='' m_name=''><d d_id='1' d_text='" +
@@ -35,15 +42,17 @@ class CommandsTest : public ::testing::Test {
                       "' d_search='1'><d_search_mask/></d><d d_id='2' d_text='" +
                       tree_.Path("Gone") + "' d_search='1'><d_search_mask/></d></m></c></o>");
     tree_.AddFolder("share/Tool");
-    tree_.AddFile("share/Tool/tool.exe", "x");
+    tree_.AddFile("share/Tool/tool.exe", "one");
     tree_.AddFile("local.xml",
                   "<trl_applicationdata><c c_text='server' c_name='server'><m m_text='apps' "
                   "m_name='apps'><d d_text='\\Tool\\' d_name='\\tool\\'><f f_text='Tool.exe' "
                   "f_name='tool.exe'/></d></m></c></trl_applicationdata>");
     tree_.AddFile("fingerprint.xml",
-                  "<fp><a a_id='1'><v v_id='1' v_seq='1'><f f_id='1' "
-                  "f_name='tool.exe' f_relpath='' f_weight='1'><p p_type='2' "
-                  "p_weight='1' p_value='1'/></f></v></a></fp>");
+                  "<fp><a a_id='1' a_name='Tool'>"
+                  "<v v_id='1' v_name='1.0' v_seq='1'><f f_id='1' f_name='tool.exe' f_relpath='' "
+                  "f_weight='1'><p p_type='2' p_weight='1' p_value='3'/></f></v>"
+                  "<v v_id='2' v_name='2.0' v_seq='2'><f f_id='1' f_name='tool.exe' f_relpath='' "
+                  "f_weight='1'><p p_type='2' p_weight='1' p_value='5'/></f></v></a></fp>");
     tree_.AddFile("matches.xml",
                   "<trl_applicationdata><c><m><d><a a_id='1'>"
                   "<v v_id='1' v_name='One' v_seq='1' v_max='3' v_act='3' f_max='2' f_act='1'/>"
@@ -59,6 +68,7 @@ class CommandsTest : public ::testing::Test {
                                   "<a a_id='7' a_manage='0' v_id='1'><v v_id='1'/></a>"
                                   "<a a_id='8' a_name='Gone' v_id='1'/></d></m></c>"
                                   "</trl_applicationdata>");
+    tree_.AddFile("inventory.xml", kEmptyUserData);
     tree_.AddFile("new.xml", place +
                                  "<a a_id='7' a_name='Kept' v_id='2'><v v_id='2'/></a></d></m></c>"
                                  "</trl_applicationdata>");
@@ -92,6 +102,13 @@ class CommandsTest : public ::testing::Test {
     }
   }
 
+  // Locate on the localhost search, with user data that starts empty.
+  int Locate(const std::string& more) {
+    const std::string inputs = "--search-options @search.xml --fingerprint @fingerprint.xml ";
+    return Run("locate " + inputs + "--user-data @inventory.xml " + more).first;
+  }
+
+  static constexpr const char* kEmptyUserData = "<trl_applicationdata/>";
   testing::TempTree tree_;
 };
 
@@ -172,6 +189,47 @@ TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
   ::testing::internal::GetCapturedStderr();
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("out.xml")));
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("db.xml")));
+}
+
+TEST_F(CommandsTest, SaveReplacesTheUserDataAndKeepsTheOldOneAsBackup) {
+  ASSERT_EQ(Locate("--save --output @out.xml"), kExitOk);
+  xml::Document saved;
+  ASSERT_TRUE(saved.LoadXml(ReadFile(tree_.Native("inventory.xml"))));
+  EXPECT_EQ(saved.AsNode().CountNodes("/trl_applicationdata/c/m/d/a[@v_name='1.0']"), 1u);
+  // The user data holds the inventory only; the run's events go to the output.
+  EXPECT_EQ(saved.AsNode().CountNodes("//events"), 0u);
+  EXPECT_THAT(ReadFile(tree_.Native("out.xml")), HasSubstr("</events></trl_applicationdata>"));
+  EXPECT_EQ(ReadFile(tree_.Native("inventory.xml.bak")), kEmptyUserData);
+  // No temporary file is left beside them: two folders, eight inputs, out.xml and the backup.
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Root()), {}), 12);
+}
+
+TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
+  // Ctrl-C arrives on the first pass of the event loop, before the search has begun.
+  Timer interrupt;
+  interrupt.Tick([&interrupt] {
+    interrupt.Enabled(false);
+    std::raise(SIGINT);
+  });
+  interrupt.Interval(1);
+  interrupt.Enabled(true);
+  int code = Locate("--save --output @out.xml");
+  EXPECT_EQ(code, kExitInterrupted);
+  EXPECT_EQ(ReadFile(tree_.Native("inventory.xml")), kEmptyUserData);
+  EXPECT_FALSE(std::filesystem::exists(tree_.Native("inventory.xml.bak")));
+  // What the search had when it stopped is written, marked as cancelled.
+  EXPECT_THAT(ReadFile(tree_.Native("out.xml")), HasSubstr("cancelled=\"1\""));
+}
+
+TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
+  ASSERT_EQ(Locate("--save --format table --output @first.txt"), kExitOk);
+  EXPECT_THAT(ReadFile(tree_.Native("first.txt")), ContainsRegex("Tool +1\\.0 +new\n"));
+
+  tree_.AddFile("App/tool.exe", "three");
+  ASSERT_EQ(Locate("--save --format table --output @second.txt"), kExitOk);
+  std::string second = ReadFile(tree_.Native("second.txt"));
+  EXPECT_THAT(second, ContainsRegex("Tool +2\\.0 +updated from 1\\.0\n"));
+  EXPECT_THAT(second, HasSubstr("1 application listed, 1 changed since the last run"));
 }
 
 TEST(FilterNamesTest, NumbersAndNamesGiveTheOptionBitsAndAnythingElseIsRefused) {
