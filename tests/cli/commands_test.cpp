@@ -1,14 +1,18 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <CLI/CLI.hpp>
+#include <algorithm>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
+#include <functional>
 #include <map>
+#include <sstream>
 #include <string>
 #include <vector>
 
 #include "command_error.h"
-#include "command_test_support.h"
 #include "compare_command.h"
 #include "filter_command.h"
 #include "filter_names.h"
@@ -27,6 +31,15 @@ namespace {
 
 using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
+using Strings = std::vector<std::string>;
+using AddCommand = std::function<std::function<int()>(CLI::App&)>;
+
+std::string ReadFile(const std::string& path) {
+  std::ifstream in(path, std::ios::binary);
+  std::stringstream text;
+  text << in.rdbuf();
+  return text.str();
+}
 
 // A tree with inputs for each command. Command lines name its files as "@name".
 class CommandsTest : public ::testing::Test {
@@ -94,7 +107,11 @@ class CommandsTest : public ::testing::Test {
         {"locate", AddLocateCommand}, {"fingerprint", AddFingerprintCommand}};
     std::vector<std::string> args = testing::Words(Expand(line));
     try {
-      return {RunCommand(kCommands.at(args[0]), args[0], {args.begin() + 1, args.end()}), ""};
+      CLI::App app;
+      auto run = kCommands.at(args[0])(app);
+      std::reverse(args.begin(), args.end());  // CLI11 takes the arguments last first
+      app.parse(args);
+      return {run(), ""};
     } catch (const CommandError& error) {
       return {error.ExitCode(), error.what()};
     } catch (const CLI::ParseError& error) {
@@ -230,6 +247,24 @@ TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
   std::string second = ReadFile(tree_.Native("second.txt"));
   EXPECT_THAT(second, ContainsRegex("Tool +2\\.0 +updated from 1\\.0\n"));
   EXPECT_THAT(second, HasSubstr("1 application listed, 1 changed since the last run"));
+}
+
+TEST_F(CommandsTest, FingerprintAddCreatesThenRewritesTheDatabase) {
+  tree_.AddFile("share/Tool/README.md", "1");
+  tree_.AddFolder("db");
+  const std::string add =
+      "fingerprint add --app-id 4 --app-name Tool --seq 1 --folder @share --database @db/fp.xml";
+  EXPECT_EQ(Run(add + " --version-id 1 --version-name v1").first, kExitOk);
+  ::testing::internal::CaptureStdout();
+  EXPECT_EQ(Run(add + " --version-id 2 --version-name v2").first, kExitOk);
+  EXPECT_EQ(::testing::internal::GetCapturedStdout(),
+            Expand("@db/fp.xml: application 4, version 2 (v2): 2 files\n"));
+  auto written = testing::Parse(ReadFile(tree_.Native("db/fp.xml")));
+  EXPECT_EQ(testing::ValuesOf(*written, "/trl_fingerprint/a/v", "v_id"), (Strings{"1", "2"}));
+  EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_relpath"), (Strings(4, "Tool")));
+  EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
+  // Neither a backup nor a temporary file is left beside the database.
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Native("db")), {}), 1);
 }
 
 TEST(FilterNamesTest, NumbersAndNamesGiveTheOptionBitsAndAnythingElseIsRefused) {

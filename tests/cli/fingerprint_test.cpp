@@ -1,13 +1,10 @@
 #include <gtest/gtest.h>
 
-#include <filesystem>
 #include <string>
 #include <vector>
 
 #include "command_error.h"
-#include "command_test_support.h"
 #include "fingerprint_author.h"
-#include "fingerprint_command.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
@@ -115,32 +112,6 @@ TEST_F(FingerprintAuthorTest, VersionsGoToTheApplicationWithTheSameIdAndATakenId
   EXPECT_EQ(ValuesOf(*database, "/db/a", "a_parent"), (Strings{"<absent>", "<absent>", "7"}));
   EXPECT_EQ(ValuesOf(*database, "/db/a[@a_id='7']/v", "v_id"), (Strings{"1", "2", "3", "4"}));
   EXPECT_EQ(ValuesOf(*database, "/db/a/v[@v_id='2']/f/p[@p_type='2']", "p_value"), Strings{"3"});
-}
-
-TEST(FingerprintCommandTest, CreatesThenRewritesTheDatabase) {
-  testing::TempTree tree;
-  tree.AddFolder("one/bin");
-  tree.AddFile("one/bin/tool", "1");
-  tree.AddFile("one/bin/README.md", "1");
-  tree.AddFolder("db");
-  const std::string database = tree.Native("db/fingerprint.xml");
-  auto add = [&](std::string id) {
-    return RunCommand(AddFingerprintCommand, "fingerprint",
-                      testing::Words("add --app-id 4 --app-name Tool --seq 1 --version-id " + id +
-                                     " --version-name v" + id + " --folder " + tree.Native("one") +
-                                     " --database " + database));
-  };
-  EXPECT_EQ(add("1"), kExitOk);
-  ::testing::internal::CaptureStdout();
-  EXPECT_EQ(add("2"), kExitOk);
-  EXPECT_EQ(::testing::internal::GetCapturedStdout(),
-            database + ": application 4, version 2 (v2): 2 files\n");
-  auto written = Parse(ReadFile(database));
-  EXPECT_EQ(ValuesOf(*written, "/trl_fingerprint/a/v", "v_id"), (Strings{"1", "2"}));
-  EXPECT_EQ(ValuesOf(*written, "//f", "f_relpath"), (Strings{"bin", "bin", "bin", "bin"}));
-  EXPECT_EQ(ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
-  // Neither a backup nor a temporary file is left beside the database.
-  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree.Native("db")), {}), 1);
 }
 
 }  // namespace
