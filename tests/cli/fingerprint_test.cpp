@@ -19,16 +19,10 @@ using Strings = std::vector<std::string>;
 class FingerprintAuthorTest : public ::testing::Test {
  protected:
   ReferenceVersion Version(std::string appId, std::string versionId) const {
-    return {.folder = tree_.Path("app"),
-            .appId = appId,
-            .appName = "Tool",
-            .parentId = std::nullopt,
-            .versionId = versionId,
-            .versionName = "1.0",
-            .seq = "3"};
+    return {tree_.Path("app"), appId, "Tool", std::nullopt, versionId, "1.0", "3"};
   }
-  xml::Node Add(xml::Document& database, const ReferenceVersion& version) {
-    return AddReferenceVersion(database, version, *fileSystem_);
+  void Add(xml::Document& database, const ReferenceVersion& version) {
+    AddReferenceVersion(database, version, *fileSystem_);
   }
 
   testing::TempTree tree_;
