@@ -7,9 +7,10 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <iterator>
 #include <map>
-#include <sstream>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "command_error.h"
@@ -33,13 +34,6 @@ using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
 using Strings = std::vector<std::string>;
 using AddCommand = std::function<std::function<int()>(CLI::App&)>;
-
-std::string ReadFile(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  std::stringstream text;
-  text << in.rdbuf();
-  return text.str();
-}
 
 // A tree with inputs for each command. Command lines name its files as "@name".
 class CommandsTest : public ::testing::Test {
@@ -88,6 +82,11 @@ class CommandsTest : public ::testing::Test {
   }
   void TearDown() override { ReleaseSharedReporter(); }
 
+  std::string Read(const std::string& name) const {
+    std::ifstream in(tree_.Native(name), std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), {}};
+  }
+
   // `text` with each "@name" replaced by the native path of `name` in the tree.
   std::string Expand(std::string text) const {
     for (size_t at = text.find('@'); at != std::string::npos; at = text.find('@', at)) {
@@ -130,11 +129,8 @@ class CommandsTest : public ::testing::Test {
 };
 
 TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageReports) {
-  struct Case {
-    std::string line;
-    std::string printed;
-    std::string selects;  // exactly one node of the output
-  } cases[] = {
+  // A command line, what it prints, and a path to exactly one node of its output.
+  const std::tuple<std::string, std::string, std::string> cases[] = {
       {"search --search-options @search.xml",
        "trllocator: warning: Path '" + tree_.Path("Gone") + "\\' could not be found\n",
        "/*/c/m/d/f[@f_text='Main.exe']"},
@@ -147,14 +143,14 @@ TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageRepor
        "/trl_applicationdata[a_missing/a[@a_id='8']]/c/m/d/a[@a_id='7'][@a_manage='0']/v_history/"
        "v[@v_id='1']"},
   };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.line);
+  for (const auto& [line, printed, selects] : cases) {
+    SCOPED_TRACE(line);
     ::testing::internal::CaptureStderr();
-    EXPECT_EQ(Run(c.line + " --output @out.xml"), std::make_pair(kExitOk, std::string()));
-    EXPECT_EQ(::testing::internal::GetCapturedStderr(), c.printed);
+    EXPECT_EQ(Run(line + " --output @out.xml"), std::make_pair(kExitOk, std::string()));
+    EXPECT_EQ(::testing::internal::GetCapturedStderr(), printed);
     xml::Document out;
-    ASSERT_TRUE(out.LoadXml(ReadFile(tree_.Native("out.xml"))));
-    EXPECT_EQ(out.AsNode().CountNodes(c.selects), 1u);
+    ASSERT_TRUE(out.LoadXml(Read("out.xml")));
+    EXPECT_EQ(out.AsNode().CountNodes(selects), 1u);
     std::filesystem::remove(tree_.Native("out.xml"));
   }
 }
@@ -162,11 +158,8 @@ TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageRepor
 TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
   tree_.AddFile("broken.xml", "<a>\n  <b></a>");
   const std::string add = "fingerprint add --app-id 1 --version-name v --seq 1 --folder ";
-  struct Case {
-    std::string line;
-    int exitCode;
-    std::string message;  // how it begins
-  } cases[] = {
+  // A command line, its exit code and how its message begins.
+  const std::tuple<std::string, int, std::string> cases[] = {
       {"search --search-options @missing.xml", kExitBadInput,
        "cannot read the search options '@missing.xml': No such file or directory"},
       {"search --search-options @search.xml/x.xml", kExitBadInput,
@@ -198,10 +191,10 @@ TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
        "the folder '@none' does not exist"},
   };
   ::testing::internal::CaptureStderr();
-  for (const Case& c : cases) {
-    auto [code, message] = Run(c.line);
-    EXPECT_EQ(code, c.exitCode) << c.line;
-    EXPECT_EQ(message.substr(0, Expand(c.message).size()), Expand(c.message));
+  for (const auto& [line, exitCode, begins] : cases) {
+    auto [code, message] = Run(line);
+    EXPECT_EQ(code, exitCode) << line;
+    EXPECT_EQ(message.substr(0, Expand(begins).size()), Expand(begins));
   }
   ::testing::internal::GetCapturedStderr();
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("out.xml")));
@@ -211,12 +204,12 @@ TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
 TEST_F(CommandsTest, SaveReplacesTheUserDataAndKeepsTheOldOneAsBackup) {
   ASSERT_EQ(Locate("--save --output @out.xml"), kExitOk);
   xml::Document saved;
-  ASSERT_TRUE(saved.LoadXml(ReadFile(tree_.Native("inventory.xml"))));
+  ASSERT_TRUE(saved.LoadXml(Read("inventory.xml")));
   EXPECT_EQ(saved.AsNode().CountNodes("/trl_applicationdata/c/m/d/a[@v_name='1.0']"), 1u);
   // The user data holds the inventory only; the run's events go to the output.
   EXPECT_EQ(saved.AsNode().CountNodes("//events"), 0u);
-  EXPECT_THAT(ReadFile(tree_.Native("out.xml")), HasSubstr("</events></trl_applicationdata>"));
-  EXPECT_EQ(ReadFile(tree_.Native("inventory.xml.bak")), kEmptyUserData);
+  EXPECT_THAT(Read("out.xml"), HasSubstr("</events></trl_applicationdata>"));
+  EXPECT_EQ(Read("inventory.xml.bak"), kEmptyUserData);
   // No temporary file is left beside them: two folders, eight inputs, out.xml and the backup.
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Root()), {}), 12);
 }
@@ -232,19 +225,19 @@ TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
   interrupt.Enabled(true);
   int code = Locate("--save --output @out.xml");
   EXPECT_EQ(code, kExitInterrupted);
-  EXPECT_EQ(ReadFile(tree_.Native("inventory.xml")), kEmptyUserData);
+  EXPECT_EQ(Read("inventory.xml"), kEmptyUserData);
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("inventory.xml.bak")));
   // What the search had when it stopped is written, marked as cancelled.
-  EXPECT_THAT(ReadFile(tree_.Native("out.xml")), HasSubstr("cancelled=\"1\""));
+  EXPECT_THAT(Read("out.xml"), HasSubstr("cancelled=\"1\""));
 }
 
 TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
   ASSERT_EQ(Locate("--save --format table --output @first.txt"), kExitOk);
-  EXPECT_THAT(ReadFile(tree_.Native("first.txt")), ContainsRegex("Tool +1\\.0 +new\n"));
+  EXPECT_THAT(Read("first.txt"), ContainsRegex("Tool +1\\.0 +new\n"));
 
   tree_.AddFile("App/tool.exe", "three");
   ASSERT_EQ(Locate("--save --format table --output @second.txt"), kExitOk);
-  std::string second = ReadFile(tree_.Native("second.txt"));
+  std::string second = Read("second.txt");
   EXPECT_THAT(second, ContainsRegex("Tool +2\\.0 +updated from 1\\.0\n"));
   EXPECT_THAT(second, HasSubstr("1 application listed, 1 changed since the last run"));
 }
@@ -259,7 +252,7 @@ TEST_F(CommandsTest, FingerprintAddCreatesThenRewritesTheDatabase) {
   EXPECT_EQ(Run(add + " --version-id 2 --version-name v2").first, kExitOk);
   EXPECT_EQ(::testing::internal::GetCapturedStdout(),
             Expand("@db/fp.xml: application 4, version 2 (v2): 2 files\n"));
-  auto written = testing::Parse(ReadFile(tree_.Native("db/fp.xml")));
+  auto written = testing::Parse(Read("db/fp.xml"));
   EXPECT_EQ(testing::ValuesOf(*written, "/trl_fingerprint/a/v", "v_id"), (Strings{"1", "2"}));
   EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_relpath"), (Strings(4, "Tool")));
   EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
