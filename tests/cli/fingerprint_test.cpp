@@ -1,5 +1,7 @@
+#include <fmt/format.h>
 #include <gtest/gtest.h>
 
+#include <array>
 #include <string>
 #include <vector>
 
@@ -31,15 +33,10 @@ class FingerprintAuthorTest : public ::testing::Test {
 
 // Contents are RFC 1321 test inputs, so the expected digests are the published ones.
 TEST_F(FingerprintAuthorTest, DescribesEveryFileWithItsFolderWeightSizeAndDigest) {
-  struct Case {
-    const char* path;  // below the installation
-    const char* content;
-    const char* relpath;
-    const char* weight;  // 2 for documentation, 3 for the rest
-    const char* md5;
-  };
-  // In the expected order: a folder's files by name (byte order), then its subfolders.
-  const std::vector<Case> cases = {
+  // Rows: path below the installation, content, f_relpath, f_weight (2 for documentation, 3 for
+  // the rest) and digest; in the expected order: a folder's files by name (byte order), then its
+  // subfolders.
+  const std::vector<std::array<std::string, 5>> cases = {
       {"ChangeLog", "abc", "", "2", "900150983cd24fb0d6963f7d28e17f72"},
       {"README", "", "", "2", "d41d8cd98f00b204e9800998ecf8427e"},
       {"md", "a", "", "3", "0cc175b9c0f1b6a831c399e269772661"},
@@ -52,9 +49,8 @@ TEST_F(FingerprintAuthorTest, DescribesEveryFileWithItsFolderWeightSizeAndDigest
   };
   tree_.AddFolder("app/lib/sub");
   tree_.AddFolder("app/empty");
-  for (auto it = cases.rbegin(); it != cases.rend(); ++it) {
-    tree_.AddFile(std::string("app/") + it->path, it->content);
-  }
+  for (auto it = cases.rbegin(); it != cases.rend(); ++it)
+    tree_.AddFile("app/" + (*it)[0], (*it)[1]);
   ReferenceVersion version = Version("1", "10");
   version.docWeight = 2;
   version.fileWeight = 3;
@@ -64,17 +60,14 @@ TEST_F(FingerprintAuthorTest, DescribesEveryFileWithItsFolderWeightSizeAndDigest
   std::vector<xml::Node> files = database.AsNode().SelectNodes("/trl_fingerprint/a/v/f");
   ASSERT_EQ(files.size(), cases.size());
   for (size_t i = 0; i < cases.size(); ++i) {
-    const Case& c = cases[i];
-    std::string name = std::string(c.path).substr(std::string(c.path).rfind('/') + 1);
-    EXPECT_EQ(files[i].Xml(), "<f f_id=\"" + std::to_string(i + 1) + "\" f_name=\"" + name +
-                                  "\" f_relpath=\"" + c.relpath + "\" f_weight=\"" + c.weight +
-                                  "\"><p p_type=\"2\" p_weight=\"1\" p_value=\"" +
-                                  std::to_string(std::string(c.content).size()) +
-                                  "\"/><p p_type=\"3\" p_weight=\"2\" p_value=\"" + c.md5 +
-                                  "\"/></f>")
-        << c.path;
+    const auto& [path, content, relpath, weight, md5] = cases[i];
+    EXPECT_EQ(
+        files[i].Xml(),
+        fmt::format(R"(<f f_id="{}" f_name="{}" f_relpath="{}" f_weight="{}"><p p_type="2" )"
+                    R"(p_weight="1" p_value="{}"/><p p_type="3" p_weight="2" p_value="{}"/></f>)",
+                    i + 1, path.substr(path.rfind('/') + 1), relpath, weight, content.size(), md5))
+        << path;
   }
-  EXPECT_EQ(ValuesOf(database, "/trl_fingerprint/a", "a_name"), Strings{"Tool"});
   EXPECT_EQ(database.DocumentElement().SelectSingleNode("a/v").Attributes(),
             (std::vector<std::pair<std::string, std::string>>{
                 {"v_id", "10"}, {"v_name", "1.0"}, {"v_seq", "3"}}));
