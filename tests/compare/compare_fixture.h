@@ -24,11 +24,10 @@ struct LocalFolder {
 
 // A computer of a local-files document with one drive; names need no escapes. A file's f_name is
 // its name as given: letter case must not matter to lookups.
-inline std::string Computer(std::string_view name, std::string_view local, std::string_view drive,
-                            const std::vector<LocalFolder>& folders) {
-  std::string text = "<c c_text='" + std::string(name) + "' c_name='" + Lower(std::string(name)) +
-                     "' " + std::string(local) + "><m m_text='" + std::string(drive) +
-                     "' m_name='" + Lower(std::string(drive)) + "'>";
+inline std::string Computer(const std::string& name, const std::string& local,
+                            const std::string& drive, const std::vector<LocalFolder>& folders) {
+  std::string text = "<c c_text='" + name + "' c_name='" + Lower(name) + "' " + local +
+                     "><m m_text='" + drive + "' m_name='" + Lower(drive) + "'>";
   for (const LocalFolder& folder : folders) {
     text += "<d d_text='" + folder.text + "' d_name='" + Lower(folder.text) + "'>";
     for (const std::string& file : folder.files) {
@@ -58,9 +57,9 @@ inline std::string Version(std::string_view attributes, std::string_view files) 
   std::string text = "<v " + std::string(attributes) + ">";
   int id = 0;
   for (const std::string& file : Words(files)) {
-    size_t colon = file.find(':');
-    text += "<f f_id='" + std::to_string(++id) + "' f_name='" + file.substr(0, colon) +
-            "' f_weight='" + file.substr(colon + 1) + "'/>";
+    std::vector<std::string> nameWeight = Fields(file, ':');
+    text += "<f f_id='" + std::to_string(++id) + "' f_name='" + nameWeight[0] + "' f_weight='" +
+            nameWeight[1] + "'/>";
   }
   return text + "</v>";
 }
