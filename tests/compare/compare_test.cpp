@@ -1,17 +1,141 @@
 // Fitting folders to files, scoring found files, the candidates a run tests, the copies it files
-// and prunes, and whole asynchronous runs: their reports, selection and cancel.
+// and prunes, whole asynchronous runs (their reports, selection and cancel), and version copies
+// kept aside until their version is matched against copies made at every find.
+#include "trl/compare.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <chrono>
+#include <functional>
+#include <memory>
+#include <random>
+#include <regex>
+#include <string>
+#include <string_view>
 #include <tuple>
+#include <utility>
+#include <vector>
 
-#include "compare/compare_fixture.h"
+#include "frame/error_handler.h"
 #include "platform/event_loop.h"
+#include "platform/failure.h"
+#include "support/documents.h"
 #include "support/fault_injecting_file_system.h"
+#include "support/memory_file.h"
 
 namespace trl::testing {
 namespace {
+
+// A folder of a local-files document and the names recorded in it.
+struct LocalFolder {
+  std::string text;  // d_text
+  std::vector<std::string> files;
+};
+
+// A computer of a local-files document with one drive; names need no escapes. A file's f_name is
+// its name as given: letter case must not matter to lookups.
+std::string Computer(const std::string& name, const std::string& local, const std::string& drive,
+                     const std::vector<LocalFolder>& folders) {
+  std::string text = "<c c_text='" + name + "' c_name='" + Lower(name) + "' " + local +
+                     "><m m_text='" + drive + "' m_name='" + Lower(drive) + "'>";
+  for (const LocalFolder& folder : folders) {
+    text += "<d d_text='" + folder.text + "' d_name='" + Lower(folder.text) + "'>";
+    for (const std::string& file : folder.files) {
+      text += "<f f_text='" + file + "' f_name='" + file + "'/>";
+    }
+    text += "</d>";
+  }
+  return text + "</m></c>";
+}
+
+// A local-files document with this computer alone.
+std::string LocalFiles(const std::vector<LocalFolder>& folders) {
+  return "<trl_applicationdata search_start='s0' search_end='s1'>" +
+         Computer("localhost", "c_local='1'", "", folders) + "</trl_applicationdata>";
+}
+
+// The fields of a table row; none in an empty one.
+std::vector<std::string> Fields(std::string_view row, char separator = '|') {
+  std::vector<std::string> fields;
+  if (!row.empty()) fields.emplace_back();
+  for (char c : row) c == separator ? fields.emplace_back() : fields.back() += c;
+  return fields;
+}
+
+// A fingerprint version: `files` as "name:weight ...", numbered from 1.
+std::string Version(std::string_view attributes, std::string_view files) {
+  std::string text = "<v " + std::string(attributes) + ">";
+  int id = 0;
+  for (const std::string& file : Words(files)) {
+    std::vector<std::string> nameWeight = Fields(file, ':');
+    text += "<f f_id='" + std::to_string(++id) + "' f_name='" + nameWeight[0] + "' f_weight='" +
+            nameWeight[1] + "'/>";
+  }
+  return text + "</v>";
+}
+
+// Every file asked for exists but those whose name holds "gone"; its content is its own name and
+// it was last written 2024-05-06 07:08:09. Every path tested is noted.
+class NamedFiles : public fs::FileSystem {
+ public:
+  explicit NamedFiles(std::vector<std::string>* tested = nullptr) : tested_(tested) {}
+
+  bool FileExists(std::string_view path) override {
+    if (tested_) tested_->emplace_back(path);
+    return path.find("gone") == std::string_view::npos;
+  }
+  bool FolderExists(std::string_view) override { return false; }
+  std::unique_ptr<fs::File> GetFile(std::string_view path) override {
+    std::string name(path.substr(path.rfind('\\') + 1));
+    return std::make_unique<MemoryFile>(name, name, DateTime{2024, 5, 6, 7, 8, 9});
+  }
+  std::unique_ptr<fs::Folder> GetFolder(std::string_view) override { Fail(kPathNotFound); }
+
+ private:
+  std::vector<std::string>* tested_;
+};
+
+class SwitchedCompare : public Compare {
+ public:
+  SwitchedCompare(bool draft, std::unique_ptr<fs::FileSystem> files) : Compare(std::move(files)) {
+    DraftCopies(draft);
+  }
+};
+
+class CompareTest : public ::testing::Test {
+ protected:
+  // Each test starts and ends with no reported events.
+  void SetUp() override { ReleaseSharedReporter(); }
+  void TearDown() override { ReleaseSharedReporter(); }
+
+  // The text of a synchronous run, on NamedFiles unless `files` are given.
+  static std::string Run(std::string_view fingerprint, std::string_view localFiles,
+                         bool draft = true, std::unique_ptr<fs::FileSystem> files = nullptr) {
+    SwitchedCompare compare(draft, files ? std::move(files) : std::make_unique<NamedFiles>());
+    compare.Asynchronous(false);
+    return compare.Start(nullptr, Parse(localFiles), Parse(fingerprint));
+  }
+};
+
+// The results in document order, in short: "c=c_text d=d_text a=a_id^a_max_seq v_name
+// f_act/f_max/v_act ...".
+std::string Summary(std::string_view results) {
+  auto document = Parse(results);
+  std::string text;
+  for (const xml::Node& e : document->AsNode().SelectNodes("/*/c | //d | //d/a | //a/v")) {
+    auto value = [&](const char* name) { return e.GetAttribute(name).value_or("-"); };
+    std::string tag = e.NodeName();
+    if (tag == "c") text += " c=" + value("c_text");
+    if (tag == "d") text += " d=" + value("d_text");
+    if (tag == "a") text += " a=" + value("a_id") + "^" + value("a_max_seq");
+    if (tag == "v") {
+      text += " " + value("v_name") + " " + value("f_act") + "/" + value("f_max") + "/" +
+              value("v_act");
+    }
+  }
+  return text.empty() ? text : text.substr(1);
+}
 
 using ::testing::ElementsAre;
 
@@ -250,6 +374,79 @@ TEST_F(CompareRunTest, RejectedApplicationsLeaveNoTraceAndCancelEndsBeforeTheNex
   EXPECT_EQ(Attribute("e_match_count"), "1");
   EXPECT_EQ(results_->DocumentElement().GetAttribute("cancelled"), "1");
   EXPECT_THAT(ValuesOf(*results_, "//d/a", "a_id"), ElementsAre("3"));
+}
+
+// Generated fingerprints (missing, repeated and differently written ids, nested applications,
+// shared file names) and local files (one name in several folders, listed twice or not on disk)
+// give the same results with copies drafted as with copies made at every find.
+// Sized 5 to 7 by their names; "gone.ocx" is listed but on no disk.
+const char* const kNames[] = {"a.exe", "bb.dll", "ccc.txt", "gone.ocx"};
+
+// The results text without the times a run takes.
+std::string Timeless(const std::string& text) {
+  static const std::regex times(R"( (compare_start|compare_end|time)="[^"]*")");
+  return std::regex_replace(text, times, "");
+}
+
+// A fingerprint and a local-files document drawn from `seed`.
+std::pair<std::string, std::string> Draw(uint32_t seed) {
+  std::mt19937 rng(seed);
+  auto below = [&](int n) { return static_cast<int>(rng() % static_cast<uint32_t>(n)); };
+  // Absent, empty or one of two numbers, the one also written otherwise: ids go missing and
+  // repeat.
+  auto id = [&](const char* name) {
+    const char* const values[] = {nullptr, "", "1", "1", "10", "01", "1 "};
+    const char* value = values[below(7)];
+    return value ? std::string(" ") + name + "='" + value + "'" : "";
+  };
+  int versionNames = 0;
+  auto version = [&] {
+    std::string text = "<v" + id("v_id") + " v_name='v" + std::to_string(++versionNames) +
+                       "' v_seq='" + std::to_string(below(3)) + "'>";
+    for (int n = 1 + below(3); n > 0; --n) {
+      text += "<f" + id("f_id") + " f_name='" + kNames[below(4)] + "' f_relpath='" +
+              (below(3) == 0 ? "bin" : "") + "' f_weight='" + std::to_string(below(3)) + "'>" +
+              (below(3) == 0 ? "<p p_type='2' p_weight='1' p_value='" +
+                                   std::to_string(5 + below(3)) + "'/></f>"
+                             : "</f>");
+    }
+    return text + "</v>";
+  };
+  // Some applications hold another one among their versions.
+  std::function<std::string(bool)> application = [&](bool outer) {
+    std::string text = "<a" + id("a_id") + ">";
+    int versions = 1 + below(2), nested = outer && below(5) < 2 ? below(versions + 1) : -1;
+    for (int i = 0; i <= versions; ++i) {
+      if (i == nested) text += application(false);
+      if (i < versions) text += version();
+    }
+    return text + "</a>";
+  };
+  std::string fingerprint = "<fp>";
+  for (int n = 1 + below(3); n > 0; --n) fingerprint += application(true);
+  std::vector<LocalFolder> folders;
+  for (const char* folder : {"\\p\\", "\\p\\bin\\", "\\q\\", "\\q\\bin\\"}) {
+    if (below(10) < 3) continue;
+    LocalFolder& listed = folders.emplace_back(LocalFolder{folder, {}});
+    for (const char* name : kNames) {
+      if (below(5) < 3) listed.files.insert(listed.files.end(), below(5) == 0 ? 2 : 1, name);
+    }
+  }
+  return {fingerprint + "</fp>", LocalFiles(folders)};
+}
+
+TEST_F(CompareTest, DraftedCopiesGiveTheResultsOfCopiesMadeAtEveryFind) {
+  int found = 0, empty = 0;
+  for (uint32_t seed = 1; seed <= 3000; ++seed) {
+    auto [fingerprint, localFiles] = Draw(seed);
+    std::string literal = Timeless(Run(fingerprint, localFiles, false));
+    ASSERT_EQ(Timeless(Run(fingerprint, localFiles, true)), literal) << "seed " << seed << "\n"
+                                                                     << fingerprint << "\n"
+                                                                     << localFiles;
+    ++(literal.find("<v ") != std::string::npos ? found : empty);
+  }
+  EXPECT_GT(found, 1500);
+  EXPECT_GT(empty, 500);
 }
 
 }  // namespace
