@@ -35,7 +35,6 @@ namespace trl::cli {
 namespace {
 
 using Strings = std::vector<std::string>;
-using AddCommand = std::function<std::function<int()>(CLI::App&)>;
 
 // A tree with inputs for each command. Command lines name its files as "@name".
 class CommandsTest : public ::testing::Test {
@@ -102,7 +101,7 @@ class CommandsTest : public ::testing::Test {
 
   // Runs a command line; answers the exit code and the message of the error that ended it.
   std::pair<int, std::string> Run(const std::string& line) const {
-    static const std::map<std::string, AddCommand> kCommands{
+    static const std::map<std::string, std::function<std::function<int()>(CLI::App&)>> kCommands{
         {"search", AddSearchCommand}, {"compare", AddCompareCommand},
         {"filter", AddFilterCommand}, {"merge", AddMergeCommand},
         {"locate", AddLocateCommand}, {"fingerprint", AddFingerprintCommand}};
