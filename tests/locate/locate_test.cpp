@@ -65,7 +65,6 @@ class LocateTest : public ::testing::Test {
     tree_.AddFile("Apps/Alpha/alpha.exe", "alpha one");
     tree_.AddFile("Apps/Beta/beta.exe", "beta");
   }
-  void TearDown() override { ReleaseSharedReporter(); }
 
   // Alpha in two releases told apart by the size of alpha.exe, and Beta in one; `more` joins the
   // properties of Alpha 2.0's file.
