@@ -1,3 +1,4 @@
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <functional>
@@ -12,6 +13,9 @@
 namespace trl::xml {
 namespace {
 
+using testing::FailureOf;
+using Strings = std::vector<std::string>;
+
 constexpr const char* kTree =
     "<r><c c_id=\"2\"><a a_id=\"1\" a_parent=\"0\"/><a a_id=\"3\" a_parent=\"1\"/></c>"
     "<c c_id=\"5\"><a a_id=\"4\" a_parent=\"3\"/><a a_id=\"6\" a_name=\"O'Brien\"/></c>"
@@ -20,8 +24,8 @@ constexpr const char* kTree =
 void Load(Document& doc, std::string_view text) { ASSERT_TRUE(doc.LoadXml(text)) << text; }
 
 // "tag=first attribute value" per node, which names every element of kTree.
-std::vector<std::string> Labels(const std::vector<Node>& nodes) {
-  std::vector<std::string> labels;
+Strings Labels(const std::vector<Node>& nodes) {
+  Strings labels;
   for (const Node& node : nodes) {
     auto attributes = node.Attributes();
     labels.push_back(node.NodeName() + "=" + (attributes.empty() ? "" : attributes[0].second));
@@ -29,22 +33,19 @@ std::vector<std::string> Labels(const std::vector<Node>& nodes) {
   return labels;
 }
 
-using testing::FailureOf;
-
+// A reverse axis and a union come back in document order too; a bad selection fails with 5 and
+// names itself.
 TEST(XmlDocumentTest, SelectionsFollowXPathInDocumentOrder) {
   struct Case {
     const char* context;
     const char* xpath;
-    std::vector<std::string> expected;
+    Strings expected;
   };
   const Case cases[] = {
-      {"/r", "//c[not(number(//c/@c_id) > number(@c_id))]", {"c=2", "c=5"}},
       {"/r", "//a[@a_id='3' or @a_parent='3']", {"a=3", "a=4"}},
       {"/r", "//a[@a_name=\"O'Brien\"]", {"a=6"}},
-      {"/r", "./c", {"c=2", "c=5", "c=1"}},
       {"/r/c[2]", ".//a", {"a=4", "a=6"}},
       {"/r/c[2]", "//event", {"event=x"}},
-      // A reverse axis and a union still come back in document order.
       {"/r", "//a[@a_id='6']/preceding::a", {"a=1", "a=3", "a=4"}},
       {"/r", "//c[@c_id='1'] | //a[@a_id='1']", {"a=1", "c=1"}},
       {"/r", "//zzz", {}},
@@ -58,38 +59,23 @@ TEST(XmlDocumentTest, SelectionsFollowXPathInDocumentOrder) {
     Node first = context.SelectSingleNode(c.xpath);
     EXPECT_EQ(first ? Labels({first})[0] : "", c.expected.empty() ? "" : c.expected[0]);
   }
-}
-
-TEST(XmlDocumentTest, SelectionIsASnapshot) {
-  Document doc;
-  Load(doc, kTree);
   Node root = doc.DocumentElement();
-  auto before = root.SelectNodes("//a");
-  root.AppendChild(doc.CreateElement("a"));
-  root.RemoveChild(root.SelectSingleNode("c[3]"));
-  before[0].SetAttribute("a_id", "9");
-  EXPECT_EQ(Labels(before), (std::vector<std::string>{"a=9", "a=3", "a=4", "a=6"}));
-  EXPECT_EQ(root.CountNodes("//a"), 5u);
-}
-
-TEST(XmlDocumentTest, BadSelectionsFailWithInvalidArgument) {
-  Document doc;
-  Load(doc, kTree);
-  Node root = doc.DocumentElement();
-  for (const char* xpath : {"//a[@a_name='O'Brien']", "//a[", "", "count(//a)", "//a/@a_id"}) {
+  for (const char* xpath : {"//a[", "count(//a)", "//a/@a_id"}) {
     try {
       root.SelectNodes(xpath);
       ADD_FAILURE() << xpath;
     } catch (const Failure& failure) {
       EXPECT_EQ(failure.number, kInvalidArgument) << xpath;
-      EXPECT_NE(failure.description.find(xpath), std::string::npos) << failure.description;
+      EXPECT_THAT(failure.description, ::testing::HasSubstr(xpath));
     }
     EXPECT_EQ(FailureOf([&] { root.SelectSingleNode(xpath); }), kInvalidArgument) << xpath;
     EXPECT_EQ(FailureOf([&] { root.CountNodes(xpath); }), kInvalidArgument) << xpath;
   }
 }
 
-TEST(XmlDocumentTest, AttributesKeepOrderAndTellAbsentFromEmpty) {
+// Attributes keep their order and tell absent from empty; documents are written raw, without
+// declaration or blank text between elements, and read back as they were.
+TEST(XmlDocumentTest, AttributesAndWriting) {
   Document doc;
   Load(doc, "<x b=\"1\" a=\"2\" c=\"\"/>");
   Node x = doc.DocumentElement();
@@ -99,48 +85,36 @@ TEST(XmlDocumentTest, AttributesKeepOrderAndTellAbsentFromEmpty) {
   x.SetAttribute("d", "tab\tline\nquote\"<&>");
   x.RemoveAttribute("b");
   x.RemoveAttribute("zz");
-  EXPECT_EQ(x.GetAttribute("b"), std::nullopt);
   std::string written = doc.Xml();
   EXPECT_EQ(written, "<x a=\"9\" c=\"\" d=\"tab&#09;line&#10;quote&quot;&lt;&amp;>\"/>");
   Load(doc, written);
   EXPECT_EQ(doc.DocumentElement().Attributes(),
             (std::vector<std::pair<std::string, std::string>>{
                 {"a", "9"}, {"c", ""}, {"d", "tab\tline\nquote\"<&>"}}));
-}
 
-TEST(XmlDocumentTest, WritesRawWithoutDeclaration) {
   const std::pair<const char*, const char*> cases[] = {
-      {"<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<r>\n  <a x=\"1\"/>\n  <b>t &amp; "
-       "u</b>\n</r>\n",
+      {"<?xml version=\"1.0\"?>\n<r>\n  <a x=\"1\"/>\n  <b>t &amp; u</b>\n</r>\n",
        "<r><a x=\"1\"/><b>t &amp; u</b></r>"},
-      {"<!-- c --><?pi data?><r><![CDATA[a<b]]></r><!--d-->",
-       "<!-- c --><?pi data?><r><![CDATA[a<b]]></r><!--d-->"},
-      {"<r> <a> x </a> \xC3\xA9 </r>", "<r><a> x </a> \xC3\xA9 </r>"},
-      {"<r a=\"&#x20AC;\">&#65;&gt;</r>", "<r a=\"\xE2\x82\xAC\">A&gt;</r>"},
+      {"<!-- c --><?pi data?><r><![CDATA[a<b]]> \xC3\xA9 </r><!--d-->",
+       "<!-- c --><?pi data?><r><![CDATA[a<b]]> \xC3\xA9 </r><!--d-->"},
   };
   for (auto [text, expected] : cases) {
-    Document doc;
     Load(doc, text);
     EXPECT_EQ(doc.Xml(), expected);
   }
-  Document doc;
-  EXPECT_EQ(doc.Xml(), "");
-  Load(doc, kTree);
-  EXPECT_EQ(doc.AsNode().SelectSingleNode("//events").Xml(), "<events><event e=\"x\"/></events>");
+  EXPECT_EQ(Document().Xml(), "");
 }
 
+// A failed load leaves the document empty and tells where, in lines and byte columns.
 TEST(XmlDocumentTest, FailedLoadEmptiesAndTellsWhere) {
   testing::TempTree tree;
   tree.AddFile("bad.xml", "<r>\n\n <x></r>");
   struct Case {
     std::function<bool(Document&)> load;
-    int64_t line;
-    int64_t column;
+    int64_t line, column;
   };
   const Case cases[] = {
-      {[](Document& doc) { return doc.LoadXml(""); }, 1, 1},
       {[](Document& doc) { return doc.LoadXml("<r>\n<a>\n</b></r>"); }, 3, 3},
-      {[](Document& doc) { return doc.LoadXml("<r>\n  <a b=1/>\n</r>"); }, 2, 8},
       {[&](Document& doc) { return doc.Load(tree.Native("bad.xml")); }, 3, 7},
       {[&](Document& doc) { return doc.Load(tree.Native("missing.xml")); }, 0, 0},
   };
@@ -168,12 +142,10 @@ TEST(XmlDocumentTest, HandlesToNoObjectFailWithNinetyOne) {
   const std::function<void()> actions[] = {[&] { none.NodeName(); },
                                            [&] { none.GetAttribute("a"); },
                                            [&] { none.SetAttribute("a", "1"); },
-                                           [&] { none.ParentNode(); },
+                                           [&] { none.OwnerDocument(); },
                                            [&] { none.ChildNodes(); },
                                            [&] { none.SelectNodes("a"); },
-                                           [&] { none.AppendChild(c); },
-                                           [&] { none.CloneNode(true); },
-                                           [&] { none.SetText("t"); },
+                                           [&] { none.RemoveChild(c); },
                                            [&] { none.Xml(); },
                                            [&] { root.AppendChild(none); },
                                            [&] { root.InsertBefore(none, c); },
@@ -218,15 +190,13 @@ TEST(XmlDocumentTest, MisuseFailsWithFiveAndChangesNothing) {
                                                 [&] {
                                                   a.AppendElement("n", {{"v", "1"}, {"v", "2"}});
                                                 }};
-  for (std::string_view name : {"1a", "", "a b", "-x", "a\xFF"}) {
+  for (std::string_view name : {"-x", "", "a b", "a\xFF", "\xCC\x80"}) {
     actions.push_back([&doc, name] { doc.CreateElement(name); });
     actions.push_back([&a, name] { a.SetAttribute(name, "1"); });
     actions.push_back([&a, name] { a.AppendElement(name, {{"v", "1"}}); });
     actions.push_back([&a, name] { a.AppendElement("n", {{"v", "1"}, {name, "1"}}); });
   }
-  const std::string_view controls[] = {"bell\x07", std::string_view("nul\0x", 5), "\xC3",
-                                       "\xEF\xBF\xBE", "\xED\xA0\x80"};
-  for (std::string_view value : controls) {
+  for (std::string_view value : {"bell\x07", "\xC3"}) {
     actions.push_back([&a, value] { a.SetAttribute("v", value); });
     actions.push_back([&a, value] { a.SetText(value); });
     actions.push_back([&a, value] { a.AppendElement("n", {{"v", "1"}, {"w", value}}); });
@@ -255,20 +225,18 @@ TEST(XmlDocumentTest, DocumentElementIsReplacedInPlace) {
   Node a = doc.DocumentElement().FirstChild();
   EXPECT_EQ(doc.SetDocumentElement(a), a);
   EXPECT_EQ(doc.Xml(), "<!--c--><a/><!--d-->");
-  EXPECT_EQ(a.ParentNode().Type(), NodeType::kDocument);
 
   Document other;
   Load(other, "<m x=\"1\"><k/></m>");
-  uint64_t otherCount = other.ModificationCount();
   Node copied = doc.SetDocumentElement(other.DocumentElement());
-  EXPECT_EQ(&copied.OwnerDocument(), &doc);
   EXPECT_EQ(doc.DocumentElement(), copied);
   EXPECT_EQ(doc.Xml(), "<!--c--><m x=\"1\"><k/></m><!--d-->");
   EXPECT_EQ(other.Xml(), "");
-  EXPECT_GT(other.ModificationCount(), otherCount);
 }
 
-TEST(XmlDocumentTest, MovesWithinADocumentKeepTheHandle) {
+// Within a document a node moves and its handle stays; from another document it is copied here
+// and removed there.
+TEST(XmlDocumentTest, Moves) {
   Document doc;
   Load(doc, "<r><x><a/><b/></x><y/></r>");
   Node x = doc.DocumentElement().FirstChild();
@@ -276,7 +244,6 @@ TEST(XmlDocumentTest, MovesWithinADocumentKeepTheHandle) {
   Node b = x.ChildNodes()[1];
   Node y = x.ParentNode().ChildNodes()[1];
   EXPECT_EQ(y.AppendChild(a), a);
-  EXPECT_EQ(a.ParentNode(), y);
   EXPECT_EQ(y.InsertBefore(b, a), b);
   EXPECT_EQ(doc.Xml(), "<r><x/><y><b/><a/></y></r>");
   EXPECT_EQ(y.InsertBefore(a, b), a);
@@ -285,28 +252,18 @@ TEST(XmlDocumentTest, MovesWithinADocumentKeepTheHandle) {
   // Replacing a node by its own child lifts the child into its place.
   EXPECT_EQ(doc.DocumentElement().ReplaceChild(b, y), b);
   EXPECT_EQ(doc.Xml(), "<r><x/><b/></r>");
-  doc.DocumentElement().RemoveChild(x);
-  EXPECT_EQ(doc.Xml(), "<r><b/></r>");
-}
 
-TEST(XmlDocumentTest, MovesAcrossDocumentsCopyAndRemove) {
   Document source;
-  Load(source, "<s><a k=\"1\"><b/></a><c/><d/></s>");
-  Document target;
-  Load(target, "<t><z/></t>");
-  Node t = target.DocumentElement();
-  Node s = source.DocumentElement();
-  Node moved = t.AppendChild(s.FirstChild());
-  EXPECT_EQ(&moved.OwnerDocument(), &target);
+  Load(source, "<s><a k=\"1\"><b/></a><c/></s>");
+  Node moved = doc.DocumentElement().InsertBefore(source.DocumentElement().FirstChild(), b);
+  EXPECT_EQ(&moved.OwnerDocument(), &doc);
   moved.SetAttribute("k", "2");
-  Node inserted = t.InsertBefore(s.FirstChild(), t.FirstChild());
-  Node replacing = t.ReplaceChild(s.FirstChild(), t.ChildNodes()[1]);
-  EXPECT_EQ(replacing.ParentNode(), t);
-  EXPECT_EQ(inserted, t.FirstChild());
-  EXPECT_EQ(target.Xml(), "<t><c/><d/><a k=\"2\"><b/></a></t>");
-  EXPECT_EQ(source.Xml(), "<s/>");
+  EXPECT_EQ(doc.Xml(), "<r><x/><a k=\"2\"><b/></a><b/></r>");
+  EXPECT_EQ(source.Xml(), "<s><c/></s>");
 }
 
+// Created and cloned nodes are in no listing, selection or text until placed; a detached node
+// selects within its own subtree.
 TEST(XmlDocumentTest, DetachedNodesStayOutOfSight) {
   Document doc;
   Node detached = doc.CreateElement("c");
@@ -320,48 +277,41 @@ TEST(XmlDocumentTest, DetachedNodesStayOutOfSight) {
   detached.AppendChild(doc.CreateElement("m"));
   Node clone = root.FirstChild().CloneNode(true);
   for (Node node : {detached, clone}) EXPECT_TRUE(node.ParentNode().IsNull());
-  EXPECT_EQ(Labels(doc.AsNode().SelectNodes("//c")), std::vector<std::string>{"c=1"});
+  EXPECT_EQ(Labels(doc.AsNode().SelectNodes("//c")), Strings{"c=1"});
   EXPECT_EQ(doc.AsNode().CountNodes("//*"), 3u);
   EXPECT_EQ(root.GetElementsByTagName("*").size(), 2u);
   EXPECT_EQ(doc.AsNode().GetElementsByTagName("m").size(), 1u);
   EXPECT_EQ(doc.AsNode().ChildNodes(), std::vector<Node>{root});
   EXPECT_EQ(doc.Xml(), "<r><c id=\"1\"><m/></c></r>");
-  // A detached node selects within its own subtree.
   EXPECT_EQ(detached.SelectNodes("//m").size(), 1u);
   EXPECT_EQ(detached.SelectSingleNode("."), detached);
 
   EXPECT_EQ(root.AppendChild(detached), detached);
   EXPECT_EQ(detached.ParentNode(), root);
-  EXPECT_EQ(Labels(doc.AsNode().SelectNodes("//c")), (std::vector<std::string>{"c=1", "c=2"}));
+  EXPECT_EQ(Labels(doc.AsNode().SelectNodes("//c")), (Strings{"c=1", "c=2"}));
   root.AppendChild(clone);
   EXPECT_EQ(doc.AsNode().CountNodes("/node()"), 1u);
   EXPECT_EQ(root.CloneNode(false).Xml(), "<r/>");
   EXPECT_EQ(clone.Xml(), "<c id=\"1\"><m/></c>");
 }
 
-// What "./tag" selects, without a selection: direct children only, comments and text aside.
-TEST(XmlDocumentTest, ChildElementsByTag) {
+// Children by tag, as "./tag" selects them, and node names, texts and their changes.
+TEST(XmlDocumentTest, ChildrenNamesAndText) {
   Document doc;
   Load(doc, "<r>t<a i='1'/><b/><a i='2'><a i='3'/></a><!--a--><a i='4'/></r>");
   Node r = doc.DocumentElement();
-  std::vector<std::string> ids;
-  for (Node a : r.ChildElements("a")) ids.push_back(a.GetAttribute("i").value_or(""));
-  EXPECT_EQ(ids, (std::vector<std::string>{"1", "2", "4"}));
+  EXPECT_EQ(Labels(r.ChildElements("a")), (Strings{"a=1", "a=2", "a=4"}));
   EXPECT_EQ(r.CountChildElements("a"), 3u);
   EXPECT_EQ(r.CountChildElements("a", 2), 2u);
   EXPECT_EQ(r.CountChildElements("b", 2), 1u);
-  EXPECT_EQ(r.CountChildElements("c"), 0u);
-}
 
-TEST(XmlDocumentTest, TextAndNames) {
-  Document doc;
   Load(doc, "<r>a<b>b<![CDATA[c]]></b><!--z--><?p q?>d</r>");
-  Node r = doc.DocumentElement();
+  r = doc.DocumentElement();
   EXPECT_EQ(doc.AsNode().Text(), "abcd");
-  std::vector<std::string> names;
+  Strings names;
   for (Node node : doc.AsNode().SelectNodes("//node()")) names.push_back(node.NodeName());
-  EXPECT_EQ(names, (std::vector<std::string>{"r", "#text", "b", "#text", "#cdata-section",
-                                             "#comment", "p", "#text"}));
+  EXPECT_EQ(names,
+            (Strings{"r", "#text", "b", "#text", "#cdata-section", "#comment", "p", "#text"}));
   EXPECT_EQ(doc.AsNode().NodeName(), "#document");
   r.ChildNodes()[2].SetText(" y ");
   EXPECT_EQ(FailureOf([&] { r.ChildNodes()[2].SetText("a--b"); }), kInvalidArgument);
@@ -392,9 +342,7 @@ TEST(XmlDocumentTest, CountsChangesAndNumbersDocuments) {
   auto gone = std::make_unique<Document>();
   uint64_t goneSerial = gone->Serial();
   gone.reset();
-  Document later;
-  EXPECT_NE(doc.Serial(), goneSerial);
-  EXPECT_GT(later.Serial(), goneSerial);
+  EXPECT_GT(Document().Serial(), goneSerial);
 }
 
 }  // namespace
