@@ -88,10 +88,18 @@ TEST(EventLoopTest, TiedTimersTickInArmingOrder) {
   EXPECT_THAT(order, ElementsAre(1, 0, 1, 0, 1, 0));
 }
 
-// RunUntil sleeps until the condition holds, the timeout passes or another thread wakes it.
+// RunUntil sleeps until a timer is due, the timeout passes or another thread wakes it.
 TEST(EventLoopTest, RunUntilEndsOnTimeoutOrWake) {
   auto& loop = EventLoop::Current();
+  int ticks = 0;
+  Timer timer([&] { ++ticks; });
+  Start(timer, 50);
   auto start = Clock::now();
+  EXPECT_TRUE(loop.RunUntil([&] { return ticks == 1; }, milliseconds(5000)));
+  EXPECT_LT(Clock::now() - start, milliseconds(2000));  // woken for the tick, not at the timeout
+  timer.Enabled(false);
+
+  start = Clock::now();
   EXPECT_FALSE(loop.RunUntil([] { return false; }, milliseconds(30)));
   EXPECT_GE(Clock::now() - start, milliseconds(30));
 

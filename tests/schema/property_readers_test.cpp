@@ -1,15 +1,11 @@
 #include <gtest/gtest.h>
-#include <utime.h>
 
-#include <algorithm>
 #include <string>
 
 #include "platform/failure.h"
-#include "platform/fs/posix/posix_file_system.h"
 #include "schema/schema.h"
 #include "support/failure_of.h"
 #include "support/memory_file.h"
-#include "support/temp_tree.h"
 
 namespace trl {
 namespace {
@@ -41,22 +37,6 @@ TEST(PropertyReadersTest, ReadFromMemory) {
   broken.FailReadsFrom(0, kDeviceIoError);
   EXPECT_EQ(FailureOf([&] { schema.ReadPropertyType1(broken); }), kDeviceIoError);
   EXPECT_EQ(FailureOf([&] { schema.ReadPropertyType3(broken); }), kDeviceIoError);
-}
-
-TEST(PropertyReadersTest, ReadFromRealFiles) {
-  testing::TempTree tree;
-  tree.AddFile("abc", "abc");
-  const utimbuf times{1600000000, 1600000000};
-  ASSERT_EQ(utime(tree.Native("abc").c_str(), &times), 0);
-  auto files = fs::CreatePosixFileSystem({});
-  auto file = files->GetFile(tree.Path("abc"));
-  Schema schema;
-  EXPECT_EQ(schema.ReadPropertyType2(*file), 3);
-  EXPECT_EQ(schema.ReadPropertyType3(*file), "900150983cd24fb0d6963f7d28e17f72");
-  EXPECT_EQ(schema.ReadPropertyType4(*file), FromTimeT(1600000000));
-  std::string fixture = TRL_TEST_DATA "/versioned64.exe";
-  std::replace(fixture.begin(), fixture.end(), '/', '\\');
-  EXPECT_EQ(schema.ReadPropertyType1(*files->GetFile(fixture)), "1.2.3.4");
 }
 
 }  // namespace
