@@ -72,6 +72,17 @@ TEST(EventLoopTest, StoppedTimerNeverTicks) {
   }
 }
 
+// A new interval on an enabled timer counts from the change.
+TEST(EventLoopTest, ANewIntervalReArmsAnEnabledTimer) {
+  int ticks = 0;
+  Timer timer([&] { ++ticks; });
+  Start(timer, 1000);
+  timer.Interval(1);
+  SleepFor(5);
+  Yield();
+  EXPECT_EQ(ticks, 1);
+}
+
 // Timers re-armed in one pass share a deadline and keep the order in which they were armed (1
 // before 0, so an order by address would differ), pass after pass.
 TEST(EventLoopTest, TiedTimersTickInArmingOrder) {
