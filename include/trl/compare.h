@@ -84,8 +84,9 @@ class Compare : public Worker {
                                                     const std::vector<xml::Node>& versions) const;
   void MakeVersionCopy(const xml::Node& v, const VersionDraft& draft);
   void RaiseApplicationProgress(xml::Node a, bool matched);
-  // The path of the candidate's file named `name`, on its own computer or through the network.
-  static std::string CandidatePath(const LocalFileRecord& record, const std::string& name);
+  // The path of the candidate's own file, as the search wrote it, on its own computer or through
+  // the network: of names that differ only in case, each reaches its own file.
+  static std::string CandidatePath(const LocalFileRecord& record);
 
   // `files`: how many f the local files hold, at most what the index gets.
   void FillRecordset(size_t files);
@@ -133,6 +134,9 @@ class Compare : public Worker {
   };
   // By application folder; a folder is mostly found on one drive only.
   std::unordered_map<std::string, std::vector<FoundPlace>> placesFound_;
+  // Reused by each fingerprint file: its candidates, and the places one of them stands for.
+  std::vector<LocalFileRecord> candidates_;
+  std::vector<std::string> places_;
 
   // Every results copy of an application by a_id, so that pruning one application never scans
   // the whole results.

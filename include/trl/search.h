@@ -4,6 +4,7 @@
 #include <memory>
 #include <string>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "trl/worker.h"
@@ -16,6 +17,7 @@ class Schema;
 namespace fs {
 class File;
 class FileSystem;
+class Folder;
 }  // namespace fs
 
 // The first stage of a locate run: walks the computers, drives and folders the search options
@@ -56,6 +58,7 @@ class Search : public Worker {
     int16_t folderMask = 0;
     int16_t fileMask = 0;
     int16_t properties = 0;
+    bool links = false;  // links to folders are noted
     xml::Node computer;  // the c and m elements of the results being added to
     xml::Node drive;
   };
@@ -74,6 +77,22 @@ class Search : public Worker {
   void FindFiles(const std::string& path, xml::Node parent, const std::string& relativePath,
                  bool recurse, int16_t folderMask, int16_t fileMask, int16_t properties);
   bool AddFile(xml::Node folder, const fs::File& file, int16_t properties);
+  // The encoded name of a folder: with its case kept below a folder that has a case sibling.
+  std::string EncodedFolder(const std::string& relativePath) const;
+
+  // Links to folders, noted while the folders of one drive are walked and written under its
+  // element when they are done, for those that lead into a walked folder.
+  struct LinkNotes {
+    struct Root {
+      std::string real, relative;
+      bool recurse;
+    };
+    std::vector<Root> roots;
+    std::vector<std::pair<std::string, std::string>> links;  // relative path, target's real path
+  };
+  void NoteSearchedRoot(const std::string& relativePath);
+  void NoteFolderLinks(fs::Folder& folder, const std::string& relativePath);
+  void WriteFolderLinks();
   static bool CheckAttributes(int16_t attributes, int16_t mask);
   void ReportPathNotFound(const std::string& path);
   void RaiseProgress(const OnError& on, const std::string& path);
@@ -98,6 +117,8 @@ class Search : public Worker {
   std::string startTime_;  // formatted
   Reading read_;
   bool patternUsable_ = true;  // an invalid pattern is reported once, where it is set
+  bool caseExact_ = false;     // the walk is below a folder that has a case sibling
+  LinkNotes linkNotes_;
 
   // Built on the first probe of a run: the fingerprint applications by a_id and by a_parent.
   std::unique_ptr<std::unordered_map<std::string, std::vector<xml::Node>>> applicationsById_;

@@ -4,6 +4,7 @@
 #include <optional>
 #include <unordered_set>
 
+#include "compare/candidates.h"
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
 #include "compare/fingerprint_file.h"
@@ -209,28 +210,36 @@ bool Compare::MatchVersion(xml::Node v) {
   VersionMatch match(v, files, draftedVersions_.contains(v.Id()),
                      draftCopies_ && v.ParentNode().GetAttribute(vocab::a_id));
   // What a failed step would have produced keeps its value from the file or candidate before.
-  std::string name, key, appFolder;
+  std::string spelled, name, key;
   int16_t mask = -1;
+  std::vector<LocalFileRecord>& records = candidates_;
+  std::vector<std::string>& places = places_;
   for (const xml::Node& f : files) {
     YieldIfAsynchronous(on);
-    on([&] { name = LowerCase(TextOf(f, vocab::f_name)); });
+    on([&] {
+      spelled = TextOf(f, vocab::f_name);
+      name = LowerCase(spelled);
+    });
     on([&] { key = Use(objSchema).EncodeName(name); });
     LocalFileIndex::Matches candidates;
     on([&] { candidates = Use(rsLocalFiles).Find(key); });
+    records.clear();
+    for (LocalFileRecord record : candidates) records.push_back(record);
     std::optional<FingerprintFile> file;
-    for (LocalFileRecord record : candidates) {
+    for (size_t i = 0; i < records.size(); ++i) {
+      const LocalFileRecord& record = records[i];
       YieldIfAsynchronous(on);
       if (!file) file.emplace(f);
-      appFolder = file->Fit().AppFolder(record.Folder());
-      if (!appFolder.empty()) {
-        std::string path = CandidatePath(record, name);
+      CandidatePlaces(file->Fit(), *rsLocalFiles, record, places);
+      if (!places.empty() && !SpeltOtherwiseHere(records, i, spelled)) {
+        std::string path = CandidatePath(record);
         on([&] { mask = MatchFile(path, *file); });
       } else {
         mask = -1;
       }
       YieldIfAsynchronous(on);
       if (mask < 0) continue;
-      RecordFind(match, record, appFolder, *file, mask);
+      for (const std::string& place : places) RecordFind(match, record, place, *file, mask);
       found = true;
     }
   }
@@ -322,18 +331,18 @@ bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
   return found;
 }
 
-std::string Compare::CandidatePath(const LocalFileRecord& record, const std::string& name) {
+std::string Compare::CandidatePath(const LocalFileRecord& record) {
   std::string path;
-  path.reserve(record.Machine().size() + record.Drive().size() + record.Folder().size() +
-               name.size() + 3);
+  path.reserve(record.Machine().size() + record.Drive().size() + record.ExactFolder().size() +
+               record.Filename().size() + 3);
   if (!record.LocalMachine()) {
     path += "\\\\";
     path += record.Machine();
     path += '\\';
   }
   path += record.Drive();
-  path += record.Folder();
-  path += name;
+  path += record.ExactFolder();
+  path += record.Filename();
   return path;
 }
 

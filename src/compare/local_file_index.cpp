@@ -6,6 +6,7 @@
 
 #include "platform/failure.h"
 #include "platform/text.h"
+#include "schema/schema.h"
 
 namespace trl {
 namespace {
@@ -21,8 +22,6 @@ std::string_view Key(std::string_view name, std::string& lowered) {
 }
 
 }  // namespace
-
-int32_t LocalFileRecord::FileID() const { return index_->records_[record_].fileId; }
 
 const std::string& LocalFileRecord::Machine() const {
   const auto& record = index_->records_[record_];
@@ -57,9 +56,11 @@ const std::string& LocalFileRecord::Folder() const {
   return index_->folders_[index_->records_[record_].folder].folder;
 }
 
-const std::string& LocalFileRecord::EncodedFolder() const {
-  return index_->folders_[index_->records_[record_].folder].encodedFolder;
+const std::string& LocalFileRecord::ExactFolder() const {
+  return index_->folders_[index_->records_[record_].folder].exactFolder;
 }
+
+uint32_t LocalFileRecord::FolderIndex() const { return index_->records_[record_].folder; }
 
 std::string_view LocalFileRecord::Filename() const {
   return index_->NameAt(index_->records_[record_].filename);
@@ -89,17 +90,31 @@ void LocalFileIndex::AddDrive(std::string machine, std::string encodedMachine, b
                      std::move(encodedDrive)});
 }
 
-void LocalFileIndex::AddFolder(std::string folder, std::string encodedFolder) {
+void LocalFileIndex::AddLink(std::string link, std::string target) {
   if (drives_.empty()) AddDrive("", "", false, "", "");
-  folders_.push_back(
-      {std::move(folder), std::move(encodedFolder), static_cast<uint32_t>(drives_.size() - 1)});
+  drives_.back().links.Add(std::move(link), std::move(target));
 }
 
-void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
-                             std::string_view encodedFilename) {
+const std::vector<FolderAlias>& LocalFileIndex::AliasesOf(const LocalFileRecord& record) const {
+  static const std::vector<FolderAlias> kNoAliases;
+  const FolderEntry& folder = folders_[record.FolderIndex()];
+  const FolderLinks& links = drives_[folder.drive].links;
+  if (links.empty()) return kNoAliases;
+  auto [at, added] = aliases_.try_emplace(record.FolderIndex());
+  if (added) at->second = links.AliasesOf(folder.folder);
+  return at->second;
+}
+
+void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder) {
+  if (drives_.empty()) AddDrive("", "", false, "", "");
+  folders_.push_back(
+      {std::move(folder), std::move(exactFolder), static_cast<uint32_t>(drives_.size() - 1)});
+}
+
+void LocalFileIndex::AddFile(std::string_view filename, std::string_view encodedFilename) {
   if (folders_.empty()) AddFolder("", "");
   std::string lowered;
-  std::string_view key = Key(encodedFilename, lowered);
+  std::string_view key = Schema::FoldedName(Key(encodedFilename, lowered));
   if (records_.size() >= kNone - 1) Fail(kOutOfMemory);
   if (2 * (keys_ + 1) > slots_.size()) Grow();
   // Room first, so that a failing allocation leaves no chain pointing past the records.
@@ -117,14 +132,13 @@ void LocalFileIndex::AddFile(int32_t fileId, std::string_view filename,
     records_[slot.last].next = record;
     slot.last = record;
   }
-  records_.push_back(
-      {fileId, static_cast<uint32_t>(folders_.size() - 1), kNone, encodedAt, filenameAt});
+  records_.push_back({static_cast<uint32_t>(folders_.size() - 1), kNone, encodedAt, filenameAt});
 }
 
 LocalFileIndex::Matches LocalFileIndex::Find(std::string_view key) const {
   if (slots_.empty()) return {};
   std::string lowered;
-  std::string_view lookup = Key(key, lowered);
+  std::string_view lookup = Schema::FoldedName(Key(key, lowered));
   return {this, slots_[Probe(lookup, Hash(lookup))].first};
 }
 

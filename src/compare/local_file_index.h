@@ -3,7 +3,10 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
+
+#include "compare/folder_links.h"
 
 namespace trl {
 
@@ -13,7 +16,6 @@ class LocalFileIndex;
 // valid while the index lives.
 class LocalFileRecord {
  public:
-  int32_t FileID() const;
   const std::string& Machine() const;
   const std::string& EncodedMachine() const;
   bool LocalMachine() const;
@@ -21,10 +23,14 @@ class LocalFileRecord {
   const std::string& EncodedDrive() const;
   // The listed drive the record is on: the same for every record of one drive entry.
   uint32_t DriveIndex() const;
+  // The folder lower-cased, for fitting; the folder and the file name as the search wrote them,
+  // for the path to the file itself.
   const std::string& Folder() const;
-  const std::string& EncodedFolder() const;
+  const std::string& ExactFolder() const;
   std::string_view Filename() const;
   std::string_view EncodedFilename() const;
+  // The listed folder the record is in: the same for every record of one folder entry.
+  uint32_t FolderIndex() const;
 
  private:
   friend class LocalFileIndex;
@@ -35,7 +41,8 @@ class LocalFileRecord {
 };
 
 // The local files of a search flattened into records, in the order they were added, with an index
-// from the encoded file name (regardless of case) to its records, also in the order added. The
+// from the encoded file name (regardless of case, and of the exact form a name with a case
+// sibling has) to its records, also in the order added. The
 // computer and drive of a record are shared with the other records of its drive and its folder
 // with those of its folder, so that a record costs little more than its names.
 class LocalFileIndex {
@@ -75,11 +82,18 @@ class LocalFileIndex {
   // The computer and drive of the records added next.
   void AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
                 std::string drive, std::string encodedDrive);
-  // The folder of the records added next, on the last drive added (none yet: an empty one).
-  void AddFolder(std::string folder, std::string encodedFolder);
+  // The folder of the records added next, on the last drive added (none yet: an empty one):
+  // lower-cased and as written.
+  void AddFolder(std::string folder, std::string exactFolder);
   // A record in the last folder added (none yet: an empty one). The encoded name is kept
-  // lower-cased, the plain name as given.
-  void AddFile(int32_t fileId, std::string_view filename, std::string_view encodedFilename);
+  // lower-cased and folded, the plain name as given.
+  void AddFile(std::string_view filename, std::string_view encodedFilename);
+
+  // A link to a folder on the last drive added (see FolderLinks).
+  void AddLink(std::string link, std::string target);
+  // Where the record's folder also stands through the links of its drive; worked out once per
+  // folder.
+  const std::vector<FolderAlias>& AliasesOf(const LocalFileRecord& record) const;
 
   // The records whose encoded file name equals `key`, letter case aside.
   Matches Find(std::string_view key) const;
@@ -94,15 +108,15 @@ class LocalFileIndex {
     std::string machine, encodedMachine;
     bool localMachine;
     std::string drive, encodedDrive;
+    FolderLinks links;
   };
   struct FolderEntry {
-    std::string folder, encodedFolder;
+    std::string folder, exactFolder;
     uint32_t drive;
   };
-  // 20 bytes; the names are in `names_`, each followed by '\0'. The plain name shares the encoded
+  // 16 bytes; the names are in `names_`, each followed by '\0'. The plain name shares the encoded
   // one's text when they are equal, as they mostly are.
   struct Record {
-    int32_t fileId;
     uint32_t folder;
     uint32_t next;  // the next record under the same key
     uint32_t encodedFilename;
@@ -130,6 +144,7 @@ class LocalFileIndex {
   std::vector<Record> records_;
   std::string names_;
   std::vector<Slot> slots_;  // a power of two in size, at most half full
+  mutable std::unordered_map<uint32_t, std::vector<FolderAlias>> aliases_;  // by folder
   size_t keys_ = 0;
 };
 

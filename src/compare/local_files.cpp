@@ -21,14 +21,13 @@ using compare::kClass;
 
 void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
   OnError on{kClass, compare::kFillRecordsetLabel};
-  int32_t fileId = 0;
   std::vector<xml::Node> computers;
   on([&] {
     if (!localFiles.DocumentElement()) Fail(kObjectNotSet);
     computers = localFiles.AsNode().GetElementsByTagName(vocab::c);
   });
   // A value that cannot be read keeps what the element before gave.
-  std::string machine, encodedMachine, drive, encodedDrive, folder, encodedFolder, filename,
+  std::string machine, encodedMachine, drive, encodedDrive, folder, exactFolder, filename,
       encodedFilename;
   for (const xml::Node& c : computers) {
     on([&] { machine = TextOf(c, vocab::c_text); });
@@ -38,15 +37,22 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
       on([&] { drive = TextOf(m, vocab::m_text); });
       on([&] { encodedDrive = TextOf(m, vocab::m_name); });
       on([&] { Use(index).AddDrive(machine, encodedMachine, local, drive, encodedDrive); });
+      for (const xml::Node& l : m.ChildElements(vocab::l)) {
+        auto text = l.GetAttribute(vocab::l_text);
+        auto target = l.GetAttribute(vocab::l_target);
+        if (index != nullptr && text && target) index->AddLink(LowerCase(*text), LowerCase(*target));
+      }
       for (const xml::Node& d : m.ChildElements(vocab::d)) {
-        on([&] { folder = LowerCase(TextOf(d, vocab::d_text)); });
-        on([&] { encodedFolder = LowerCase(TextOf(d, vocab::d_name)); });
-        on([&] { Use(index).AddFolder(folder, encodedFolder); });
+        on([&] {
+          exactFolder = TextOf(d, vocab::d_text);
+          folder = LowerCase(exactFolder);
+        });
+        on([&] { TextOf(d, vocab::d_name); });  // not needed, but a folder without one is reported
+        on([&] { Use(index).AddFolder(folder, exactFolder); });
         for (const xml::Node& f : d.ChildElements(vocab::f)) {
-          on([&] { fileId = CheckedAdd(fileId, 1); });
-          on([&] { filename = LowerCase(TextOf(f, vocab::f_text)); });
+          on([&] { filename = TextOf(f, vocab::f_text); });
           on([&] { encodedFilename = TextOf(f, vocab::f_name); });
-          on([&] { Use(index).AddFile(fileId, filename, encodedFilename); });
+          on([&] { Use(index).AddFile(filename, encodedFilename); });
         }
       }
     }

@@ -66,6 +66,29 @@ void CopyAttribute(const xml::Node& from, xml::Node& to, const char* attribute) 
   if (auto value = from.GetAttribute(attribute)) to.SetAttribute(attribute, *value);
 }
 
+std::string PercentEscaped(std::string text) {
+  static constexpr char kHex[] = "0123456789ABCDEF";
+  if (std::none_of(text.begin(), text.end(),
+                   [](char c) { return NeedsPercentEscape(static_cast<unsigned char>(c)); })) {
+    return text;  // the common case, without a second copy
+  }
+  std::string encoded;
+  encoded.reserve(text.size());
+  for (char c : text) {
+    auto byte = static_cast<unsigned char>(c);
+    if (NeedsPercentEscape(byte)) {
+      encoded += '%';
+      encoded += kHex[byte >> 4];
+      encoded += kHex[byte & 0xF];
+    } else {
+      encoded += c;
+    }
+  }
+  return encoded;
+}
+
+constexpr std::string_view kExactMark = "%~";
+
 }  // namespace
 
 struct Schema::Impl {
@@ -133,25 +156,18 @@ Schema::Schema(std::vector<std::string> localNames) : impl_(std::make_unique<Imp
 Schema::~Schema() = default;
 
 std::string Schema::EncodeName(std::string_view text) const {
-  static constexpr char kHex[] = "0123456789ABCDEF";
-  std::string lower = LowerCase(text);
-  if (std::none_of(lower.begin(), lower.end(),
-                   [](char c) { return NeedsPercentEscape(static_cast<unsigned char>(c)); })) {
-    return lower;  // the common case, without a second copy
-  }
-  std::string encoded;
-  encoded.reserve(lower.size());
-  for (char c : lower) {
-    auto byte = static_cast<unsigned char>(c);
-    if (NeedsPercentEscape(byte)) {
-      encoded += '%';
-      encoded += kHex[byte >> 4];
-      encoded += kHex[byte & 0xF];
-    } else {
-      encoded += c;
-    }
-  }
+  return PercentEscaped(LowerCase(text));
+}
+
+std::string Schema::EncodeExactName(std::string_view text) const {
+  std::string encoded = EncodeName(text);
+  encoded += kExactMark;
+  encoded += PercentEscaped(std::string(text));
   return encoded;
+}
+
+std::string_view Schema::FoldedName(std::string_view encoded) {
+  return encoded.substr(0, encoded.find(kExactMark));
 }
 
 xml::Node Schema::AddComputer(std::string_view text, std::string_view name, xml::Node parent,

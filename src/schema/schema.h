@@ -26,6 +26,12 @@ class Schema {
   // Unicode lower-case, then "%", "'", "\"" and control characters as "%XX": equal lower-cased
   // names give equal output, and every output can stand between apostrophes in a selection.
   std::string EncodeName(std::string_view text) const;
+  // The encoded name of an item whose name differs from a sibling's only in letter case, so that
+  // the two are told apart: EncodeName, "%~" and the name with its case kept, escaped alike.
+  // No output of EncodeName holds "%~".
+  std::string EncodeExactName(std::string_view text) const;
+  // The output of EncodeName that an encoded name, exact or not, was made from.
+  static std::string_view FoldedName(std::string_view encoded);
 
   // Find-or-add under `parent`: the first child of the level whose encoded name attribute equals
   // `name`, or a new child appended with the id (++counter) as its first attribute, then the text

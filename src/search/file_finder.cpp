@@ -1,4 +1,5 @@
 #include <array>
+#include <utility>
 
 #include "frame/error_handler.h"
 #include "frame/use_object.h"
@@ -75,7 +76,7 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
     xml::Node folder;
     if (!on([&] {
           Schema& schema = Use(objSchema);
-          folder = schema.AddFolder(relativePath, schema.EncodeName(relativePath), parent,
+          folder = schema.AddFolder(relativePath, EncodedFolder(relativePath), parent,
                                     lngFolderCounter);
         })) {
       return;
@@ -107,7 +108,7 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
       // The record is made before any file is tested: a folder whose files all fail still shows.
       bool recorded = on([&] {
         Schema& schema = Use(objSchema);
-        record = schema.AddFolder(relativePath, schema.EncodeName(relativePath), parent,
+        record = schema.AddFolder(relativePath, EncodedFolder(relativePath), parent,
                                   lngFolderCounter);
       });
       for (const auto& file : *files) {
@@ -122,6 +123,7 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
       }
     }
     on([&] { lngFolderCount = CheckedAdd(lngFolderCount, 1); });
+    if (read_.links) on([&] { NoteFolderLinks(*folder, relativePath); });
     if (recurse) {
       const auto* subFolders = ListedOrNone([&]() -> const auto& { return folder->SubFolders(); });
       if (subFolders != nullptr) {
@@ -129,13 +131,17 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
           YieldIfAsynchronous(on);
           std::string name;
           std::string subPath;
+          bool sibling = false;
           if (on([&] {
                 name = subFolder->Name();
                 subPath = subFolder->Path() + "\\";
+                sibling = subFolder->HasCaseSibling();
               }) &&
               !name.empty()) {
+            bool outer = std::exchange(caseExact_, caseExact_ || sibling);
             FindFiles(subPath, parent, relativePath + name + "\\", recurse, folderMask, fileMask,
                       properties);
+            caseExact_ = outer;
           }
           if (status_ == kStatusCancelled) return;
         }
@@ -143,6 +149,11 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
     }
   }
   YieldIfAsynchronous(on);
+}
+
+std::string Search::EncodedFolder(const std::string& relativePath) const {
+  Schema& schema = Use(objSchema);
+  return caseExact_ ? schema.EncodeExactName(relativePath) : schema.EncodeName(relativePath);
 }
 
 bool Search::AddFile(xml::Node folder, const fs::File& file, int16_t properties) {
@@ -156,7 +167,9 @@ bool Search::AddFile(xml::Node folder, const fs::File& file, int16_t properties)
   xml::Node entry;
   if (!on([&] {
         Schema& schema = Use(objSchema);
-        entry = schema.AddFileEntry(name, schema.EncodeName(name), folder, lngFileCounter);
+        entry = schema.AddFileEntry(
+            name, file.HasCaseSibling() ? schema.EncodeExactName(name) : schema.EncodeName(name),
+            folder, lngFileCounter);
       })) {
     return false;
   }

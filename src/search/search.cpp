@@ -83,6 +83,8 @@ void Search::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicat
   read_ = Reading{};
   on([&] { Use(objRegExp).Pattern(""); });
   patternUsable_ = true;
+  caseExact_ = false;
+  linkNotes_ = {};
   applicationsById_.reset();
 }
 
@@ -130,6 +132,8 @@ void Search::WalkSearchOptions() {
       for (const xml::Node& d : entries) {
         if (!WalkFolderEntry(d)) return;
       }
+      if (!linkNotes_.links.empty()) WriteFolderLinks();
+      linkNotes_ = {};
     }
   }
 }
@@ -153,6 +157,8 @@ bool Search::WalkFolderEntry(xml::Node entry) {
     on([&] { r.folderMask = ToInt16(control(vocab::d_search_d_attributes, "33")); });
     on([&] { r.fileMask = ToInt16(control(vocab::d_search_f_attributes, "33")); });
     on([&] { r.properties = ToInt16(control(vocab::d_search_f_properties, "0")); });
+    on([&] { r.links = control(vocab::d_search_links, "0") == "1"; });
+    if (r.links) NoteSearchedRoot(r.folder);
     // An invalid pattern is reported here, once; AddFile then passes over every name quietly.
     on([&] {
       xml::Node mask = entry.SelectSingleNode(vocab::d_search_mask);

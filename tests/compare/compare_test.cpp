@@ -245,7 +245,7 @@ TEST_F(CompareTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFi
           R"(f_relpath="bin" f_weight="1"/></v></a></fp>)",
           localFiles, true, std::make_unique<NamedFiles>(&tested));
   EXPECT_THAT(tested,
-              ElementsAre("/mnt\\acme\\bin\\acme.exe", "\\\\fileserver\\apps\\acme\\bin\\acme.exe",
+              ElementsAre("/mnt\\Acme\\Bin\\acme.exe", "\\\\fileserver\\apps\\acme\\bin\\ACME.EXE",
                           "\\\\elsewhere\\apps\\bin\\acme.exe"));
   EXPECT_EQ(Summary(results),
             "c=localhost d=\\acme\\ a=1^1 v 1/1/1 c=fileserver d=\\acme\\ a=1^1 v 1/1/1 "

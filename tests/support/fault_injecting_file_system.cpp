@@ -34,6 +34,7 @@ class FaultyFile : public fs::File {
     faults_.Enter(Operation::kOpenFile, target_.Path());
     return target_.Open();
   }
+  bool HasCaseSibling() const override { return target_.HasCaseSibling(); }
 
  private:
   std::unique_ptr<fs::File> owned_;
@@ -63,6 +64,12 @@ class FaultyFolder : public fs::Folder {
     List();
     return subFolders_;
   }
+
+  const std::vector<fs::FolderLink>& FolderLinks() override {
+    List();
+    return target_.FolderLinks();
+  }
+  bool HasCaseSibling() const override { return target_.HasCaseSibling(); }
 
  private:
   void List() {

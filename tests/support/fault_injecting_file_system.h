@@ -38,6 +38,7 @@ class FaultInjectingFileSystem : public fs::FileSystem {
   bool FolderExists(std::string_view path) override;
   std::unique_ptr<fs::File> GetFile(std::string_view path) override;
   std::unique_ptr<fs::Folder> GetFolder(std::string_view path) override;
+  std::string RealPath(std::string_view path) override { return target_.RealPath(path); }
 
   // Counts `operation` and fails it when a rule says so; for the wrapped folders and files.
   void Enter(Operation operation, std::string_view path);

@@ -41,11 +41,20 @@ class File {
   virtual uint64_t Size() const = 0;
   virtual DateTime DateLastModified() const = 0;
   virtual std::unique_ptr<FileReader> Open() const = 0;
+  // Whether its folder's listing holds another file whose name differs from this one only in
+  // letter case: such names match alike, yet name different files.
+  virtual bool HasCaseSibling() const { return false; }
 };
 
 class Folder;
 template <class T>
 using Collection = std::vector<std::unique_ptr<T>>;  // Count is size()
+
+// A link to a folder found in a listing: its name and the real path of the folder it leads to.
+struct FolderLink {
+  std::string name;
+  std::string target;  // as RealPath gives it
+};
 
 class Folder {
  public:
@@ -60,6 +69,11 @@ class Folder {
   // never loops); a link to a file is a file; a dangling link is neither.
   virtual const Collection<File>& Files() = 0;
   virtual const Collection<Folder>& SubFolders() = 0;
+  // The links to folders the same listing found (a dangling link or a loop is none), in the
+  // order the file system lists them. Their targets are resolved on the first call.
+  virtual const std::vector<FolderLink>& FolderLinks() = 0;
+  // As File::HasCaseSibling, among the subfolders of the parent's listing.
+  virtual bool HasCaseSibling() const { return false; }
 };
 
 // The file system as the component sees it: paths with "\" separators, names that match
@@ -76,6 +90,10 @@ class FileSystem {
   // Drops whatever was learnt of the disk (listings, lookups), so that what follows sees it as it
   // is now. A stage calls it as each run begins: nothing learnt in one run is used by the next.
   virtual void Forget() {}
+  // The path of the item `path` names with every link resolved, in the "\" form of a local
+  // path: the same item always gives the same text, whichever way it was reached. A file system
+  // without links gives the path back as it is.
+  virtual std::string RealPath(std::string_view path) { return std::string(path); }
 };
 
 }  // namespace trl::fs

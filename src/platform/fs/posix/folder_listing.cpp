@@ -2,14 +2,50 @@
 
 #include <dirent.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <optional>
+#include <string_view>
+#include <unordered_map>
 
 #include "platform/fs/posix/posix_file.h"
 #include "platform/fs/posix/sys_calls.h"
+#include "platform/text.h"
 
 namespace trl::fs::posix {
+namespace {
+
+// Only a name with a letter that lower-casing may change can have a sibling; most folders have
+// none, and cost one pass over their names.
+bool MayChangeCase(std::string_view name) {
+  return std::any_of(name.begin(), name.end(), [](char c) {
+    return (c >= 'A' && c <= 'Z') || static_cast<unsigned char>(c) >= 0x80;
+  });
+}
+
+template <class Items, class NameOf, class Mark>
+void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
+  std::unordered_map<std::string, int> names;
+  for (const auto& item : items) {
+    const std::string& name = nameOf(item);
+    if (MayChangeCase(name)) names.try_emplace(LowerCase(name), 0);
+  }
+  if (names.empty()) return;
+  auto folded = [&](const std::string& name) {
+    return MayChangeCase(name) ? LowerCase(name) : name;
+  };
+  for (const auto& item : items) {
+    auto known = names.find(folded(nameOf(item)));
+    if (known != names.end()) ++known->second;
+  }
+  for (auto& item : items) {
+    auto known = names.find(folded(nameOf(item)));
+    if (known != names.end() && known->second > 1) mark(item);
+  }
+}
+
+}  // namespace
 
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
   FolderListing listing;
@@ -33,7 +69,11 @@ FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
     }
     if (type == DT_LNK) {
       struct stat target {};
-      if (Stat(folder->NativeChild(name), target) != 0 || S_ISDIR(target.st_mode)) continue;
+      if (Stat(folder->NativeChild(name), target) != 0) continue;
+      if (S_ISDIR(target.st_mode)) {
+        listing.folderLinks.emplace_back(name);
+        continue;
+      }
       status = ToItemStatus(target);
     }
     if (type == DT_DIR) {
@@ -48,7 +88,17 @@ FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
   if (listing.error != 0) {
     listing.files.clear();
     listing.subFolders.clear();
+    listing.folderLinks.clear();
   }
+  MarkCaseSiblings(
+      listing.files,
+      [](const auto& file) -> const std::string& {
+        return static_cast<const PosixFile&>(*file).NativeName();
+      },
+      [](auto& file) { static_cast<PosixFile&>(*file).MarkCaseSibling(); });
+  MarkCaseSiblings(
+      listing.subFolders, [](const auto& sub) -> const std::string& { return sub.nativeName; },
+      [](auto& sub) { sub.caseSibling = true; });
   return listing;
 }
 

@@ -14,15 +14,18 @@ struct FolderListing {
   struct SubFolder {
     std::shared_ptr<FolderPlace> place;
     std::string nativeName;
+    bool caseSibling = false;
   };
   int error = 0;  // the errno value that stopped the listing, 0 when it is complete
   Collection<File> files;
   std::vector<SubFolder> subFolders;
+  std::vector<std::string> folderLinks;  // native names of the links to folders
 };
 
 // Sorts the entries by d_type, so a plain file or folder costs no call; links and entries of
-// unknown type cost one stat each. A link to a folder is left out (a walk never loops) and so is
-// a dangling link. Touches nothing but `folder`'s fixed location, so any thread may list.
+// unknown type cost one stat each. A link to a folder is kept apart from the subfolders (a walk
+// never loops); a dangling link is left out. Marks the files, and the subfolders, whose names
+// differ from another's only in letter case. Touches nothing but `folder`'s fixed location, so any thread may list.
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder);
 
 }  // namespace trl::fs::posix

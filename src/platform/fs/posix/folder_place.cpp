@@ -1,5 +1,7 @@
 #include "platform/fs/posix/folder_place.h"
 
+#include <algorithm>
+
 #include "platform/fs/component_path.h"
 #include "platform/text.h"
 
@@ -20,6 +22,21 @@ bool FolderPlace::HasDosAttributes() const {
     dosAttributes_ = FileSystemType(native_, type) == 0 && IsSmbFileSystemType(type);
   }
   return *dosAttributes_;
+}
+
+int RealComponentPath(const std::string& native, std::string& out) {
+  std::string real;
+  if (int error = RealPath(native, real)) return error;
+  std::string path;
+  // Split at "/" only: a native name may hold a "\", which NameFromNative escapes.
+  for (size_t at = 1; at < real.size();) {
+    size_t end = std::min(real.find('/', at), real.size());
+    path += '\\';
+    path += NameFromNative(std::string_view(real).substr(at, end - at));
+    at = end + 1;
+  }
+  out = path.empty() ? "\\" : std::move(path);
+  return 0;
 }
 
 ItemStatus ToItemStatus(const struct stat& status) {

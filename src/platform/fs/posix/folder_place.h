@@ -39,6 +39,10 @@ class FolderPlace {
   std::shared_ptr<const FolderPlace> dosParent_;
 };
 
+// The real path of the native item `native` in the component's "\" form, each name as
+// NameFromNative makes it. Returns 0 or the errno value.
+int RealComponentPath(const std::string& native, std::string& out);
+
 // The part of a stat an item keeps.
 struct ItemStatus {
   mode_t mode = 0;

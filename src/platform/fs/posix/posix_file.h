@@ -27,6 +27,10 @@ class PosixFile final : public File {
   uint64_t Size() const override;
   DateTime DateLastModified() const override;
   std::unique_ptr<FileReader> Open() const override;
+  bool HasCaseSibling() const override { return caseSibling_; }
+
+  const std::string& NativeName() const { return nativeName_; }
+  void MarkCaseSibling() { caseSibling_ = true; }
 
  private:
   std::string Native() const { return folder_->NativeChild(nativeName_); }
@@ -37,6 +41,7 @@ class PosixFile final : public File {
   std::string nativeName_;
   mutable unsigned char type_;
   mutable std::optional<ItemStatus> status_;
+  bool caseSibling_ = false;
 };
 
 }  // namespace trl::fs::posix

@@ -79,6 +79,16 @@ class PosixFileSystem final : public FileSystem {
 
   void Forget() override { run_ = RunMemory{}; }
 
+  std::string RealPath(std::string_view path) override {
+    Item item;
+    if (int error = Find(path, item)) Fail(LookupFailure(error, kPathNotFound));
+    std::string real;
+    if (int error = RealComponentPath(item.place ? item.place->Native() : item.native, real)) {
+      Fail(LookupFailure(error, kPathNotFound));
+    }
+    return real;
+  }
+
  private:
   // Returns 0 and the item `text` names, or an errno value (ENOENT for a network path that
   // leads nowhere).

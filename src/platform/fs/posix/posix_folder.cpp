@@ -39,6 +39,21 @@ const Collection<Folder>& PosixFolder::SubFolders() {
   return subFolders_;
 }
 
+const std::vector<FolderLink>& PosixFolder::FolderLinks() {
+  List();
+  if (!links_) {
+    links_.emplace();
+    for (const auto& name : linkNames_) {
+      std::string target;
+      // A link that no longer leads anywhere, or leads round in a loop, is no link to a folder.
+      if (RealComponentPath(place_->NativeChild(name), target) == 0) {
+        links_->push_back({NameFromNative(name), std::move(target)});
+      }
+    }
+  }
+  return *links_;
+}
+
 const ItemStatus& PosixFolder::Status() const {
   if (!status_) {
     struct stat status {};
@@ -55,10 +70,12 @@ void PosixFolder::List() {
     files_ = std::move(listing.files);
     for (auto& sub : listing.subFolders) {
       if (memory_) memory_->Listed(place_, sub.place);
-      subFolders_.push_back(std::make_unique<PosixFolder>(std::move(sub.place),
-                                                          std::move(sub.nativeName), false,
-                                                          std::nullopt, memory_, readAhead_));
+      auto folder = std::make_unique<PosixFolder>(std::move(sub.place), std::move(sub.nativeName),
+                                                  false, std::nullopt, memory_, readAhead_);
+      if (sub.caseSibling) folder->MarkCaseSibling();
+      subFolders_.push_back(std::move(folder));
     }
+    linkNames_ = std::move(listing.folderLinks);
     listed_ = true;
   }
   if (listingError_ != 0) Fail(ListingFailure(listingError_));

@@ -3,6 +3,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "platform/fs/file_system.h"
 #include "platform/fs/posix/folder_place.h"
@@ -38,6 +39,10 @@ class PosixFolder final : public Folder {
   bool IsRootFolder() const override;
   const Collection<File>& Files() override;
   const Collection<Folder>& SubFolders() override;
+  const std::vector<FolderLink>& FolderLinks() override;
+  bool HasCaseSibling() const override { return caseSibling_; }
+
+  void MarkCaseSibling() { caseSibling_ = true; }
 
  private:
   const ItemStatus& Status() const;
@@ -53,6 +58,9 @@ class PosixFolder final : public Folder {
   int listingError_ = 0;
   Collection<File> files_;
   Collection<Folder> subFolders_;
+  std::vector<std::string> linkNames_;
+  std::optional<std::vector<FolderLink>> links_;  // resolved on first use
+  bool caseSibling_ = false;
 };
 
 }  // namespace trl::fs::posix

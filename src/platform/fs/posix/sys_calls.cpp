@@ -4,6 +4,8 @@
 #include <sys/xattr.h>
 
 #include <cerrno>
+#include <cstdlib>
+#include <memory>
 
 #include "platform/failure.h"
 
@@ -39,6 +41,13 @@ std::string GetExtendedAttribute(const std::string& path, const char* name) {
   char value[64];
   auto size = ::getxattr(path.c_str(), name, value, sizeof value);
   return size > 0 ? std::string(value, static_cast<size_t>(size)) : std::string();
+}
+
+int RealPath(const std::string& path, std::string& out) {
+  std::unique_ptr<char, decltype(&std::free)> real(::realpath(path.c_str(), nullptr), &std::free);
+  if (!real) return errno;
+  out = real.get();
+  return 0;
 }
 
 DIR* OpenDirectory(const std::string& path) {

@@ -28,6 +28,8 @@ int LStat(const std::string& path, struct stat& out);
 int FileSystemType(const std::string& path, int64_t& type);
 // The value of extended attribute `name`, or "" when it cannot be read.
 std::string GetExtendedAttribute(const std::string& path, const char* name);
+// The path with every link, "." and ".." resolved, from "/".
+int RealPath(const std::string& path, std::string& out);
 // nullptr with errno set on failure; an empty path is the working directory.
 DIR* OpenDirectory(const std::string& path);
 

@@ -1,0 +1,36 @@
+#include "compare/candidates.h"
+
+#include <algorithm>
+
+namespace trl {
+
+void CandidatePlaces(const FolderFit& fit, const LocalFileIndex& index,
+                     const LocalFileRecord& record, std::vector<std::string>& places) {
+  places.clear();
+  for (const FolderAlias& alias : index.AliasesOf(record)) {
+    std::string place = fit.AppFolder(alias.folder);
+    if (!place.empty() && place.size() < alias.linkEnd &&
+        std::find(places.begin(), places.end(), place) == places.end()) {
+      places.push_back(std::move(place));
+    }
+  }
+  if (places.empty()) {
+    std::string place = fit.AppFolder(record.Folder());
+    if (!place.empty()) places.push_back(std::move(place));
+  }
+}
+
+bool SpeltOtherwiseHere(const std::vector<LocalFileRecord>& candidates, size_t at,
+                        std::string_view spelled) {
+  if (candidates[at].Filename() == spelled) return false;
+  uint32_t folder = candidates[at].FolderIndex();
+  for (size_t i = at; i-- > 0 && candidates[i].FolderIndex() == folder;) {
+    if (candidates[i].Filename() == spelled) return true;
+  }
+  for (size_t i = at + 1; i < candidates.size() && candidates[i].FolderIndex() == folder; ++i) {
+    if (candidates[i].Filename() == spelled) return true;
+  }
+  return false;
+}
+
+}  // namespace trl
