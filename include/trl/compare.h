@@ -18,6 +18,7 @@ struct LocalFileFacts;
 struct VersionDraft;
 class VersionFiles;
 class LocalFileRecord;
+struct CandidatePlace;
 class Schema;
 namespace fs {
 class FileSystem;
@@ -73,11 +74,12 @@ class Compare : public Worker {
   struct VersionMatch;
   bool MatchVersion(xml::Node v);
   // Files the find of a local file for the version's file under its application folder.
-  void RecordFind(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder,
+  void RecordFind(VersionMatch& match, const LocalFileRecord& record, const CandidatePlace& appFolder,
                   const FingerprintFile& file, int16_t mask);
   // The computer, drive, application folder and application copy of a find, found or added;
   // false when a step failed.
-  bool FindPlace(VersionMatch& match, const LocalFileRecord& record, const std::string& appFolder);
+  bool FindPlace(VersionMatch& match, const LocalFileRecord& record,
+                 const CandidatePlace& appFolder);
   // The versions of `a` (the ids of `versions`) whose copies can be drafted first and made only
   // when complete: those the application's pruning will certainly find in their final state.
   std::unordered_set<const void*> DraftableVersions(const xml::Node& a,
@@ -134,9 +136,10 @@ class Compare : public Worker {
   };
   // By application folder; a folder is mostly found on one drive only.
   std::unordered_map<std::string, std::vector<FoundPlace>> placesFound_;
+  std::unordered_map<std::string, std::vector<FoundPlace>> exactPlacesFound_;
   // Reused by each fingerprint file: its candidates, and the places one of them stands for.
   std::vector<LocalFileRecord> candidates_;
-  std::vector<std::string> places_;
+  std::vector<CandidatePlace> places_;
 
   // Every results copy of an application by a_id, so that pruning one application never scans
   // the whole results.

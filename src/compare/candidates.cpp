@@ -5,18 +5,26 @@
 namespace trl {
 
 void CandidatePlaces(const FolderFit& fit, const LocalFileIndex& index,
-                     const LocalFileRecord& record, std::vector<std::string>& places) {
+                     const LocalFileRecord& record, std::vector<CandidatePlace>& places) {
   places.clear();
   for (const FolderAlias& alias : index.AliasesOf(record)) {
     std::string place = fit.AppFolder(alias.folder);
     if (!place.empty() && place.size() < alias.linkEnd &&
-        std::find(places.begin(), places.end(), place) == places.end()) {
-      places.push_back(std::move(place));
+        std::none_of(places.begin(), places.end(),
+                     [&](const CandidatePlace& known) { return known.folder == place; })) {
+      places.push_back({std::move(place)});
     }
   }
   if (places.empty()) {
     std::string place = fit.AppFolder(record.Folder());
-    if (!place.empty()) places.push_back(std::move(place));
+    if (place.empty()) return;
+    // The application folder begins the local folder, letter case aside.
+    const std::string& exact = record.ExactFolder();
+    if (record.CaseExact() && exact.size() == record.Folder().size()) {
+      places.push_back({exact.substr(0, place.size()), true});
+    } else {
+      places.push_back({std::move(place)});
+    }
   }
 }
 

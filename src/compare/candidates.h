@@ -9,13 +9,20 @@
 
 namespace trl {
 
+// An application folder a candidate stands for; `exact` when it keeps the letter case of a folder
+// that has a case sibling, and must be told apart from the sibling's.
+struct CandidatePlace {
+  std::string folder;
+  bool exact = false;
+};
+
 // The application folders a candidate's file stands for, given where the fingerprint file expects
 // to lie: the places its folder has through links, where a link lies in the part of the path the
 // fingerprint names (`bin\tar` found as \usr\bin\tar behind the link \bin), else its own place. A
 // place that only puts a link in the application folder itself is left to the real folder, so an
 // application behind a link is found once, where it really is. `places` is replaced.
 void CandidatePlaces(const FolderFit& fit, const LocalFileIndex& index,
-                     const LocalFileRecord& record, std::vector<std::string>& places);
+                     const LocalFileRecord& record, std::vector<CandidatePlace>& places);
 
 // Whether the candidate at `at` is spelt otherwise than the fingerprint's `spelled` while another
 // candidate of its folder is spelt so: a name spelt exactly stands for the fingerprint file, and

@@ -135,12 +135,14 @@ bool Compare::MatchApplication(xml::Node a) {
   on([&] { versions = a.GetElementsByTagName(vocab::v); });
   draftedVersions_ = DraftableVersions(a, versions);
   placesFound_.clear();
+  exactPlacesFound_.clear();
   for (const xml::Node& v : versions) {
     on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
     if (MatchVersion(v)) found = true;
   }
   draftedVersions_.clear();
   placesFound_.clear();
+  exactPlacesFound_.clear();
   if (found) {
     int16_t remaining = 0;
     on([&] { remaining = RemoveIncompleteApplications(TextOf(a, vocab::a_id), highest); });
@@ -213,7 +215,7 @@ bool Compare::MatchVersion(xml::Node v) {
   std::string spelled, name, key;
   int16_t mask = -1;
   std::vector<LocalFileRecord>& records = candidates_;
-  std::vector<std::string>& places = places_;
+  std::vector<CandidatePlace>& places = places_;
   for (const xml::Node& f : files) {
     YieldIfAsynchronous(on);
     on([&] {
@@ -239,7 +241,7 @@ bool Compare::MatchVersion(xml::Node v) {
       }
       YieldIfAsynchronous(on);
       if (mask < 0) continue;
-      for (const std::string& place : places) RecordFind(match, record, place, *file, mask);
+      for (const CandidatePlace& place : places) RecordFind(match, record, place, *file, mask);
       found = true;
     }
   }
@@ -250,7 +252,8 @@ bool Compare::MatchVersion(xml::Node v) {
 }
 
 void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
-                         const std::string& appFolder, const FingerprintFile& file, int16_t mask) {
+                         const CandidatePlace& appFolder, const FingerprintFile& file,
+                         int16_t mask) {
   OnError on{kClass, compare::kMatchVersionLabel};
   if (match.placesKept) {
     // While one application is matched the results only grow, so a place found once is found
@@ -258,7 +261,7 @@ void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
     // Keyed by the listed drive rather than its names: a computer listed twice only costs a
     // second find of the same place.
     const void* application = match.v.ParentNode().Id();
-    auto& here = placesFound_[appFolder];
+    auto& here = (appFolder.exact ? exactPlacesFound_ : placesFound_)[appFolder.folder];
     auto known = std::find_if(here.begin(), here.end(), [&](const FoundPlace& place) {
       return place.drive == record.DriveIndex() && place.application == application;
     });
@@ -310,7 +313,7 @@ void Compare::MakeVersionCopy(const xml::Node& v, const VersionDraft& draft) {
 }
 
 bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
-                        const std::string& appFolder) {
+                        const CandidatePlace& appFolder) {
   OnError on{kClass, compare::kMatchVersionLabel};
   bool found = on([&] {
     match.c = Use(objSchema).AddComputer(record.Machine(), record.EncodedMachine(),
@@ -322,7 +325,10 @@ bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
   });
   found &= on([&] {
     Schema& schema = Use(objSchema);
-    match.d = schema.AddFolder(appFolder, schema.EncodeName(appFolder), match.m, lngFolderCounter);
+    const std::string& text = appFolder.folder;
+    match.d = schema.AddFolder(
+        text, appFolder.exact ? schema.EncodeExactName(text) : schema.EncodeName(text), match.m,
+        lngFolderCounter);
   });
   found &= on([&] {
     match.aResult = Use(objSchema).AddApplication(match.v.ParentNode(), match.d);

@@ -62,6 +62,10 @@ const std::string& LocalFileRecord::ExactFolder() const {
 
 uint32_t LocalFileRecord::FolderIndex() const { return index_->records_[record_].folder; }
 
+bool LocalFileRecord::CaseExact() const {
+  return index_->folders_[index_->records_[record_].folder].caseExact;
+}
+
 std::string_view LocalFileRecord::Filename() const {
   return index_->NameAt(index_->records_[record_].filename);
 }
@@ -105,10 +109,10 @@ const std::vector<FolderAlias>& LocalFileIndex::AliasesOf(const LocalFileRecord&
   return at->second;
 }
 
-void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder) {
+void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, bool caseExact) {
   if (drives_.empty()) AddDrive("", "", false, "", "");
-  folders_.push_back(
-      {std::move(folder), std::move(exactFolder), static_cast<uint32_t>(drives_.size() - 1)});
+  folders_.push_back({std::move(folder), std::move(exactFolder),
+                      static_cast<uint32_t>(drives_.size() - 1), caseExact});
 }
 
 void LocalFileIndex::AddFile(std::string_view filename, std::string_view encodedFilename) {

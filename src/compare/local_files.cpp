@@ -13,6 +13,7 @@
 #include "frame/vocabulary.h"
 #include "platform/convert.h"
 #include "platform/text.h"
+#include "schema/schema.h"
 #include "trl/compare.h"
 
 namespace trl {
@@ -27,8 +28,8 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
     computers = localFiles.AsNode().GetElementsByTagName(vocab::c);
   });
   // A value that cannot be read keeps what the element before gave.
-  std::string machine, encodedMachine, drive, encodedDrive, folder, exactFolder, filename,
-      encodedFilename;
+  std::string machine, encodedMachine, drive, encodedDrive, folder, exactFolder, encodedFolder,
+      filename, encodedFilename;
   for (const xml::Node& c : computers) {
     on([&] { machine = TextOf(c, vocab::c_text); });
     on([&] { encodedMachine = TextOf(c, vocab::c_name); });
@@ -47,8 +48,11 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
           exactFolder = TextOf(d, vocab::d_text);
           folder = LowerCase(exactFolder);
         });
-        on([&] { TextOf(d, vocab::d_name); });  // not needed, but a folder without one is reported
-        on([&] { Use(index).AddFolder(folder, exactFolder); });
+        on([&] { encodedFolder = TextOf(d, vocab::d_name); });
+        on([&] {
+          bool exact = Schema::FoldedName(encodedFolder).size() != encodedFolder.size();
+          Use(index).AddFolder(folder, exactFolder, exact);
+        });
         for (const xml::Node& f : d.ChildElements(vocab::f)) {
           on([&] { filename = TextOf(f, vocab::f_text); });
           on([&] { encodedFilename = TextOf(f, vocab::f_name); });

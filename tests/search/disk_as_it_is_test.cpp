@@ -1,0 +1,109 @@
+// Search and Compare on real trees: names that differ only in letter case, and links to folders.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <map>
+
+#include "search/search_fixture.h"
+#include "trl/compare.h"
+
+namespace trl::testing {
+namespace {
+
+// A fingerprint application: each file as "name relpath size", all of one version "1".
+std::string App(const std::string& id, const std::vector<std::string>& files) {
+  std::string text = "<a a_id='" + id + "' a_name='" + id + "'><v v_id='1' v_name='1' v_seq='1'>";
+  int fileId = 0;
+  for (const std::string& file : files) {
+    auto words = Words(file);
+    text += "<f f_id='" + std::to_string(++fileId) + "' f_name='" + words[0] + "' f_relpath='" +
+            words[1] + "' f_weight='1'><p p_type='2' p_weight='1' p_value='" + words[2] +
+            "'/></f>";
+  }
+  return text + "</v></a>";
+}
+
+class DiskTest : public SearchTest {
+ protected:
+  // Searches the tree with the folder entry's `attributes`, then matches `apps` against it.
+  void Locate(const std::string& attributes, const std::string& apps) {
+    local_ = Run(LocalOptions(tree_.Path(), "d_search='1' " + attributes));
+    Compare compare(fs::CreatePosixFileSystem({}));
+    compare.Asynchronous(false);
+    results_ = Parse(compare.Start(nullptr, local_, Parse("<fp>" + apps + "</fp>")));
+  }
+
+  // Each application copy as its folder below the tree, its a_id, and each version's v_name with
+  // its files found and score.
+  std::string Found() const {
+    std::string found;
+    for (const xml::Node& a : results_->AsNode().SelectNodes("//a")) {
+      std::string folder = *a.ParentNode().GetAttribute("d_text");
+      found += (found.empty() ? "" : "|") + folder.substr(std::min(folder.size(), Root().size())) +
+               " " + *a.GetAttribute("a_id");
+      for (const xml::Node& v : a.SelectNodes("./v")) {
+        found += " " + *v.GetAttribute("v_name") + ":" + *v.GetAttribute("f_act") + "/" +
+                 *v.GetAttribute("v_act");
+      }
+    }
+    return found;
+  }
+
+  std::string Root() const { return Lower(tree_.Path()); }
+
+  xml::DocumentPtr local_, results_;
+};
+
+// Sub and sub, Makefile and makefile: four files, each recorded, each read from its own inode
+// (told by its size), each a candidate of a lookup in any case; README is found as readme.
+TEST_F(DiskTest, NamesThatDifferOnlyInCaseAreDistinctEverywhere) {
+  for (const char* folder : {"Sub", "sub", "d", "x"}) tree_.AddFolder(folder);
+  tree_.AddFile("Sub/a.txt", "1");
+  tree_.AddFile("sub/a.txt", "22");
+  tree_.AddFile("d/Makefile", "333");
+  tree_.AddFile("d/makefile", "4444");
+  tree_.AddFile("x/readme", "55555");
+  Locate("", App("one", {"a.txt \\ 1"}) + App("two", {"A.TXT \\ 2"}) +
+                 App("make", {"Makefile d 3", "makefile d 4"}) + App("doc", {"README x 5"}));
+  EXPECT_EQ(Summary(*local_, tree_.Path()),
+            "\\Sub\\ a.txt|\\d\\ Makefile makefile|\\sub\\ a.txt|\\x\\ readme");
+  EXPECT_EQ(Found(), "\\Sub\\ one 1:1/1|\\Sub\\ two 1:1/0|\\sub\\ one 1:1/0|\\sub\\ two 1:1/1|"
+                     "\\ make 1:2/2|\\ doc 1:1/1");
+}
+
+// A package split between bin\ (a link to usr\bin, and b2, a link to that link) and usr\sbin is
+// found once, whole, at the root; one that lies only under bin\ at the root, not at usr\, with its
+// file counted once; an application wholly behind a link (current -> 1.2) once, where it really
+// is. A link out of the tree is not noted, and a loop (up -> ..) leads nowhere. Without the option, links stay unseen.
+TEST_F(DiskTest, LinksToFoldersPlaceFilesWhereTheLinksPutThem) {
+  for (const char* folder : {"usr/bin", "usr/sbin", "opt/app/1.2/lib"}) tree_.AddFolder(folder);
+  tree_.AddFile("usr/bin/tar", "tar");
+  tree_.AddFile("usr/sbin/rmt", "rmtx");
+  tree_.AddFile("opt/app/1.2/lib/x.js", "x");
+  tree_.AddLink("bin", "usr/bin");
+  tree_.AddLink("b2", "bin");
+  tree_.AddLink("usr/bin/up", "..");
+  tree_.AddLink("opt/app/current", "1.2");
+  tree_.AddLink("out", "/usr/share");
+  const std::string apps = App("tar", {"tar bin 3", "rmt usr\\sbin 4"}) +
+                           App("binonly", {"tar bin 3"}) + App("js", {"x.js lib 1"}) +
+                           App("loop", {"tar up\\bin 3"});
+  Locate("d_search_links='1'", apps);
+  std::map<std::string, std::string> links;
+  for (const xml::Node& l : local_->AsNode().SelectNodes("//m/l")) {
+    links[l.GetAttribute("l_text")->substr(Root().size())] =
+        l.GetAttribute("l_target")->substr(Root().size());
+  }
+  EXPECT_THAT(links, ::testing::ElementsAre(::testing::Pair("\\b2\\", "\\usr\\bin\\"),
+                                            ::testing::Pair("\\bin\\", "\\usr\\bin\\"),
+                                            ::testing::Pair("\\opt\\app\\current\\",
+                                                            "\\opt\\app\\1.2\\"),
+                                            ::testing::Pair("\\usr\\bin\\up\\", "\\usr\\")));
+  EXPECT_EQ(Found(), "\\ tar 1:2/2|\\ binonly 1:1/1|\\opt\\app\\1.2\\ js 1:1/1");
+  Locate("", apps);
+  EXPECT_TRUE(local_->AsNode().SelectNodes("//m/l").empty());
+  EXPECT_EQ(Found(), "\\usr\\ binonly 1:1/1|\\opt\\app\\1.2\\ js 1:1/1");
+}
+
+}  // namespace
+}  // namespace trl::testing
