@@ -15,6 +15,7 @@
 #include "command_error.h"
 #include "debian_version.h"
 #include "fingerprint_command.h"
+#include "package_import.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
 
@@ -23,7 +24,7 @@ namespace {
 
 using Strings = std::vector<std::string>;
 
-bool HaveDpkg() { return std::filesystem::exists("/usr/bin/dpkg"); }
+const bool kHaveDpkg = std::filesystem::exists("/usr/bin/dpkg");
 
 TEST(DebianVersionTest, OrdersAsThePackageManagerDoes) {
   const std::vector<std::tuple<std::string, std::string, int>> cases = {
@@ -38,11 +39,21 @@ TEST(DebianVersionTest, OrdersAsThePackageManagerDoes) {
     int got = CompareDebianVersions(a, b), back = CompareDebianVersions(b, a);
     EXPECT_EQ((got > 0) - (got < 0), sign) << a << " vs " << b;
     EXPECT_EQ((back > 0) - (back < 0), -sign) << b << " vs " << a;
-    if (!HaveDpkg()) continue;
+    if (!kHaveDpkg) continue;
     const char* relation = sign < 0 ? "lt" : sign > 0 ? "gt" : "eq";
     EXPECT_EQ(
         std::system(fmt::format("dpkg --compare-versions '{}' {} '{}'", a, relation, b).c_str()), 0)
         << "dpkg disagrees: " << a << " " << relation << " " << b;
+  }
+}
+
+TEST(DocumentationPathTest, FoldersThatOnlyDocumentWeighNothingWhereverUsrShareStands) {
+  const std::vector<std::pair<std::string, bool>> cases = {
+      {"usr/share/doc/tar/copyright", true},     {"opt/x/usr/share/man/man1/t.1", true},
+      {"usr/share/lintian/overrides/tar", true}, {"usr/share/docs/tar", false},
+      {"opt/myusr/share/info/t", false},         {"usr/lib/usr/share/locale/de/t.mo", true}};
+  for (const auto& [path, documentation] : cases) {
+    EXPECT_EQ(IsDocumentationPath(path), documentation) << path;
   }
 }
 
@@ -52,7 +63,7 @@ TEST(DebianVersionTest, OrdersAsThePackageManagerDoes) {
 class ImportDpkgTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    if (!HaveDpkg()) GTEST_SKIP() << "dpkg-deb is needed to build a .deb";
+    if (!kHaveDpkg) GTEST_SKIP() << "dpkg-deb is needed to build a .deb";
     for (const char* folder : {"admin/info", "root/usr/bin", "root/usr/lib", "root/etc",
                                "root/usr/share/doc/tool", "deb/DEBIAN", "deb/usr/bin"})
       tree_.AddFolder(folder);
@@ -66,7 +77,7 @@ class ImportDpkgTest : public ::testing::Test {
     tree_.AddFile("admin/info/tool.md5sums", kA + "  usr/bin/tool\n" + kA + "  usr/bin/helper\n" +
                                                  kA + "  usr/lib/shared.so\n" + kA +
                                                  "  usr/share/doc/tool/copyright\n" + kA +
-                                                 "  usr/bin/missing\n");
+                                                 "  usr/bin/missing\n" + kA + "  etc/tool.conf\n");
     tree_.AddFile("admin/info/other:amd64.md5sums", kEmpty + "  usr/lib/shared.so\n");
     tree_.AddFile("admin/diversions", "/usr/bin/helper\n/usr/bin/helper.tool\nother\n");
     for (const char* file : {"usr/bin/tool", "usr/bin/helper.tool", "usr/lib/shared.so",
@@ -75,8 +86,10 @@ class ImportDpkgTest : public ::testing::Test {
     tree_.AddFile("deb/DEBIAN/control",
                   "Package: tool\nVersion: 1.0~rc1-1\nArchitecture: amd64\nMaintainer: A <a@b.c>\n"
                   "Description: a tool\n");
-    tree_.AddFile("deb/DEBIAN/md5sums", kAbc + "  usr/bin/tool\n");
+    tree_.AddFile("deb/DEBIAN/md5sums", kAbc + "  usr/bin/tool\n" + kAbc + "  usr/bin/tool2\n");
     tree_.AddFile("deb/usr/bin/tool", "sixsix");
+    std::filesystem::create_hard_link(tree_.Native("deb/usr/bin/tool"),
+                                      tree_.Native("deb/usr/bin/tool2"));
     ASSERT_EQ(std::system(fmt::format("dpkg-deb --root-owner-group --build {} {} >/dev/null",
                                       tree_.Native("deb"), tree_.Native("tool.deb"))
                               .c_str()),
@@ -100,18 +113,15 @@ class ImportDpkgTest : public ::testing::Test {
     }
   }
 
-  // Each file of a version as "relpath name weight size digest" ("-" for an absent property).
+  // Each file of a version as "relpath name weight", then its property values in order.
   Strings Files(xml::Document& database, const std::string& version) const {
     Strings files;
     for (const xml::Node& f :
          database.AsNode().SelectNodes("//a[@a_name='tool']/v[@v_name='" + version + "']/f")) {
-      auto property = [&](const char* type) {
-        xml::Node p = f.SelectSingleNode(std::string("p[@p_type='") + type + "']");
-        return p ? *p.GetAttribute("p_value") : "-";
-      };
-      files.push_back(fmt::format("{} {} {} {} {}", *f.GetAttribute("f_relpath"),
-                                  *f.GetAttribute("f_name"), *f.GetAttribute("f_weight"),
-                                  property("2"), property("3")));
+      files.push_back(fmt::format("{} {} {}", *f.GetAttribute("f_relpath"),
+                                  *f.GetAttribute("f_name"), *f.GetAttribute("f_weight")));
+      for (const xml::Node& p : f.ChildElements("p"))
+        files.back() += " " + *p.GetAttribute("p_value");
     }
     return files;
   }
@@ -132,29 +142,28 @@ TEST_F(ImportDpkgTest, InstalledAndArchivedVersionsKeepTheirIdsAndFollowDebianOr
   ASSERT_EQ(Import("tool --deb " + tree_.Native("tool.deb")).first, kExitOk);
   EXPECT_THAT(
       ::testing::internal::GetCapturedStdout(),
-      ::testing::EndsWith(": 2 versions added, 0 described again, 7 files (1 not on disk)\n"));
+      ::testing::EndsWith(": 2 versions added, 0 described again, 8 files (1 not on disk)\n"));
   auto first = Database();
   EXPECT_EQ(testing::ValuesOf(*first, "/*/a", "a_id"), (Strings{"7", "8"}));
-  EXPECT_EQ(testing::ValuesOf(*first, "/*/a[@a_id='8']/v", "v_name"),
-            (Strings{"1.0-1", "1.0~rc1-1"}));
   EXPECT_EQ(testing::ValuesOf(*first, "/*/a[@a_id='8']/v", "v_id"), (Strings{"1", "2"}));
   EXPECT_EQ(testing::ValuesOf(*first, "/*/a[@a_id='8']/v", "v_seq"), (Strings{"2", "1"}));
   // Documentation, the conffile and the file "other" also lists weigh 0; the diverted file lives
   // where the diversion put it; a file missing on disk keeps its digest but has no size.
   EXPECT_EQ(Files(*first, "1.0-1"),
-            (Strings{"etc tool.conf 0 - " + kAbc, "usr\\bin helper.tool 1 4 " + kA,
-                     "usr\\bin missing 1 - " + kA, "usr\\bin tool 1 4 " + kA,
+            (Strings{"etc tool.conf 0 " + kAbc, "usr\\bin helper.tool 1 4 " + kA,
+                     "usr\\bin missing 1 " + kA, "usr\\bin tool 1 4 " + kA,
                      "usr\\lib shared.so 0 4 " + kA, "usr\\share\\doc\\tool copyright 0 4 " + kA}));
-  EXPECT_EQ(Files(*first, "1.0~rc1-1"), Strings{"usr\\bin tool 1 6 " + kAbc});
+  EXPECT_EQ(Files(*first, "1.0~rc1-1"),
+            (Strings{"usr\\bin tool 1 6 " + kAbc, "usr\\bin tool2 1 6 " + kAbc}));
 
-  ASSERT_EQ(Import("other tool").first, kExitOk);
+  ASSERT_EQ(Import("other:amd64 tool --deb " + tree_.Native("tool.deb")).first, kExitOk);
   auto second = Database();
   EXPECT_EQ(testing::ValuesOf(*second, "/*/a", "a_name"),
             (Strings{"by hand", "tool", "other:amd64"}));
   EXPECT_EQ(testing::ValuesOf(*second, "/*/a", "a_id"), (Strings{"7", "8", "9"}));
   EXPECT_EQ(second->AsNode().SelectSingleNode("//a[@a_id='8']").Xml(),
             first->AsNode().SelectSingleNode("//a[@a_id='8']").Xml());
-  // "other" keeps its own file at the diverted path; the shared one weighs 0 for it too.
+  // The file both packages list weighs 0 for "other" too.
   EXPECT_EQ(testing::ValuesOf(*second, "//a[@a_id='9']/v/f", "f_weight"), Strings{"0"});
 }
 
