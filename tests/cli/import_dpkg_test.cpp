@@ -34,6 +34,7 @@ TEST(DebianVersionTest, OrdersAsThePackageManagerDoes) {
       {"1:0.1", "2.0", 1},     {"9:2", "10:1", -1},         {"0:1.0", "1.0", 0},
       {"1.0", "1.0-0", 0},     {"1.0-1~bpo1", "1.0-1", -1}, {"1.0-2", "1.0-10", -1},
       {"2.30-1", "2.3-10", 1}, {"1.2-3-4", "1.2-3-10", -1}, {"1.0-a", "1.0-A", 1},
+      {"1-1-1", "1-1a-1", -1}, {"1.19", "1.20", -1},
   };
   for (const auto& [a, b, sign] : cases) {
     int got = CompareDebianVersions(a, b), back = CompareDebianVersions(b, a);
