@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "command_error.h"
+#include "fingerprint_writer.h"
 #include "frame/vocabulary.h"
 #include "platform/failure.h"
 #include "platform/text.h"
@@ -57,21 +58,10 @@ class VersionWriter {
           fmt::format("cannot read the file '{}': {}", file.Path(), failure.description));
     }
     std::string name = file.Name();
-    std::string id = std::to_string(++fileId_);
-    std::string weight =
-        std::to_string(IsDocumentationFile(name) ? version_.docWeight : version_.fileWeight);
-    xml::Node f = v_.AppendElement(vocab::f, {{vocab::f_id, id},
-                                              {vocab::f_name, name},
-                                              {vocab::f_relpath, relpath},
-                                              {vocab::f_weight, weight}});
-    AddProperty(f, 2, kSizeWeight, size);
-    AddProperty(f, 3, kDigestWeight, digest);
-  }
-
-  static void AddProperty(xml::Node f, int type, int weight, std::string_view value) {
-    f.AppendElement(vocab::p, {{vocab::p_type, std::to_string(type)},
-                               {vocab::p_weight, std::to_string(weight)},
-                               {vocab::p_value, value}});
+    int weight = IsDocumentationFile(name) ? version_.docWeight : version_.fileWeight;
+    xml::Node f = AppendFileElement(v_, ++fileId_, name, relpath, weight);
+    AppendSizeProperty(f, size);
+    AppendDigestProperty(f, digest);
   }
 
   const ReferenceVersion& version_;
@@ -91,8 +81,7 @@ bool IsDocumentationFile(std::string_view name) {
 
 xml::Node AddReferenceVersion(xml::Document& database, const ReferenceVersion& version,
                               fs::FileSystem& fileSystem) {
-  xml::Node root = database.DocumentElement();
-  if (!root) root = database.SetDocumentElement(database.CreateElement(vocab::fingerprint_root));
+  xml::Node root = DatabaseRoot(database);
   xml::Node application = database.FindChild(root, vocab::a, vocab::a_id, version.appId);
   xml::Node old;
   if (application) old = database.FindChild(application, vocab::v, vocab::v_id, version.versionId);

@@ -24,11 +24,6 @@ struct ReferenceVersion {
   bool replace = false;  // an existing version with the same id gives way instead of failing
 };
 
-// Property weights of every fingerprint file: distinct, so that any combination of agreeing
-// properties gives its own mask.
-inline constexpr int kSizeWeight = 1;
-inline constexpr int kDigestWeight = 2;
-
 // Whether a file only documents its application (README*, CHANGELOG*, LICENSE*, *.md, any letter
 // case): installers often leave such files out, so they should not decide a match.
 bool IsDocumentationFile(std::string_view name);

@@ -14,7 +14,9 @@
 #include "command_error.h"
 #include "document_files.h"
 #include "fingerprint_author.h"
+#include "fingerprint_writer.h"
 #include "frame/vocabulary.h"
+#include "import_dpkg_command.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "platform/text.h"
 
@@ -59,14 +61,6 @@ std::string ComponentFolder(const std::string& native) {
     if (!part.empty()) path += "\\" + NameFromNative(part.native());
   }
   return path.empty() ? "\\" : path;
-}
-
-xml::DocumentPtr LoadOrCreateDatabase(const std::string& path) {
-  std::error_code error;
-  if (!std::filesystem::exists(std::filesystem::symlink_status(path, error))) {
-    return std::make_shared<xml::Document>();
-  }
-  return LoadDocumentFile(path, "fingerprint database");
 }
 
 int RunFingerprintAdd(const FingerprintAddOptions& options, bool appNameGiven) {
@@ -128,8 +122,9 @@ std::function<int()> AddFingerprintCommand(CLI::App& app) {
   add->add_flag("--replace", options->replace,
                 "Describe a version the application already has "
                 "again instead of failing");
-  return [add, appName, options] {
-    return add->parsed() ? RunFingerprintAdd(*options, appName->count() > 0) : -1;
+  std::function<int()> importDpkg = AddImportDpkgCommand(*group);
+  return [add, appName, options, importDpkg] {
+    return add->parsed() ? RunFingerprintAdd(*options, appName->count() > 0) : importDpkg();
   };
 }
 

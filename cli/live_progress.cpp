@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <utility>
 
 #include "frame/vocabulary.h"
 #include "trl/xml.h"
@@ -69,6 +70,13 @@ void LiveProgress::Update(const std::string& updateXml) {
   Draw(false);
 }
 
+void LiveProgress::Show(std::string stage, std::string detail) {
+  if (!active_) return;
+  stage_ = std::move(stage);
+  detail_ = std::move(detail);
+  Draw(false);
+}
+
 void LiveProgress::Tick() { Draw(false); }
 
 void LiveProgress::Draw(bool force) {
@@ -78,10 +86,12 @@ void LiveProgress::Draw(bool force) {
   lastDraw_ = now;
   auto seconds = std::chrono::duration_cast<std::chrono::seconds>(now - start_).count();
   std::string line =
-      fmt::format("{} {}:{:02} | {} folders, {} files | {} matched", StageName(mode_), seconds / 60,
-                  seconds % 60, folders_, files_, matched_);
+      stage_.empty()
+          ? fmt::format("{} {}:{:02} | {} folders, {} files | {} matched", StageName(mode_),
+                        seconds / 60, seconds % 60, folders_, files_, matched_)
+          : fmt::format("{} {}:{:02} | {}", stage_, seconds / 60, seconds % 60, detail_);
   size_t width = TerminalWidth(stream_) - 1;
-  if (mode_ == 1 && !path_.empty() && line.size() + 3 < width) {
+  if (stage_.empty() && mode_ == 1 && !path_.empty() && line.size() + 3 < width) {
     line += " | " + Tail(path_, width - line.size() - 3);
   }
   if (line.size() > width) line.resize(width);

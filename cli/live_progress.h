@@ -20,6 +20,8 @@ class LiveProgress {
   bool Active() const { return active_; }
   // Takes in a progress element's text (a stage's "e"), and redraws when it is time.
   void Update(const std::string& updateXml);
+  // Shows another command's own stage and what it is at, in place of a locate run's counts.
+  void Show(std::string stage, std::string detail);
   // Redraws when it is time (for the clock).
   void Tick();
   // Removes the line, so that other output starts on a clean line; the next update draws again.
@@ -34,6 +36,7 @@ class LiveProgress {
   std::chrono::steady_clock::time_point start_, lastDraw_;
   int mode_ = 0;
   std::string folders_ = "0", files_ = "0", matched_ = "0", path_;
+  std::string stage_, detail_;
 };
 
 }  // namespace trl::cli
