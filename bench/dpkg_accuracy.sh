@@ -47,11 +47,27 @@ figures() {
 
 timed import "$trllocator" fingerprint import-dpkg --all --database "$work_dir/fingerprint.xml" \
   >"$work_dir/import.out"
+# The search: "\" itself without recursion (its links to folders, /bin -> usr/bin and the like,
+# are noted), and each real folder at the top with recursion, but for the kernel's own file
+# systems (/proc, /sys, /dev), which hold no package files. SEARCH replaces all of it.
+entry() {
+  echo "<d d_text=\"$1\" d_search=\"1\" d_search_recurse=\"$2\" d_search_d_attributes=\"35\"" \
+    "d_search_f_attributes=\"35\" d_search_f_properties=\"0\" d_search_links=\"1\"><d_search_mask/></d>"
+}
+if [[ -n ${SEARCH:-} ]]; then
+  entries=$(entry "$search" True)
+else
+  entries=$(entry '\' False)
+  for folder in /*/; do
+    folder=${folder%/}
+    [[ -L $folder ]] && continue
+    case $(stat -f -c %T "$folder") in proc | sysfs | tmpfs | devtmpfs | devpts | cgroup*) continue ;; esac
+    entries+=$(entry "\\${folder#/}\\" True)
+  done
+fi
 cat >"$work_dir/search-options.xml" <<EOF2
 <trl_searchoptions><c c_id="1" c_text="localhost" c_name="localhost" c_local="1">
-<m m_id="1" m_text="" m_name="" m_type="3"><d d_id="1" d_text="$search" d_search="1"
- d_search_recurse="True" d_search_d_attributes="35" d_search_f_attributes="35"
- d_search_f_properties="0"><d_search_mask/></d></m></c></trl_searchoptions>
+<m m_id="1" m_text="" m_name="" m_type="3">$entries</m></c></trl_searchoptions>
 EOF2
 echo "<trl_applicationoptions/>" >"$work_dir/application-options.xml"
 echo "<trl_applicationdata/>" >"$work_dir/user-data.xml"

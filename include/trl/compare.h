@@ -74,8 +74,8 @@ class Compare : public Worker {
   struct VersionMatch;
   bool MatchVersion(xml::Node v);
   // Files the find of a local file for the version's file under its application folder.
-  void RecordFind(VersionMatch& match, const LocalFileRecord& record, const CandidatePlace& appFolder,
-                  const FingerprintFile& file, int16_t mask);
+  void RecordFind(VersionMatch& match, const LocalFileRecord& record,
+                  const CandidatePlace& appFolder, const FingerprintFile& file, int16_t mask);
   // The computer, drive, application folder and application copy of a find, found or added;
   // false when a step failed.
   bool FindPlace(VersionMatch& match, const LocalFileRecord& record,

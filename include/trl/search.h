@@ -85,6 +85,7 @@ class Search : public Worker {
   struct LinkNotes {
     struct Root {
       std::string real, relative;
+      bool recurse;
     };
     std::vector<Root> roots;
     std::vector<std::pair<std::string, std::string>> links;  // relative path, target's real path

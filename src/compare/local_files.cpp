@@ -41,7 +41,8 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
       for (const xml::Node& l : m.ChildElements(vocab::l)) {
         auto text = l.GetAttribute(vocab::l_text);
         auto target = l.GetAttribute(vocab::l_target);
-        if (index != nullptr && text && target) index->AddLink(LowerCase(*text), LowerCase(*target));
+        if (index != nullptr && text && target)
+          index->AddLink(LowerCase(*text), LowerCase(*target));
       }
       for (const xml::Node& d : m.ChildElements(vocab::d)) {
         on([&] {

@@ -76,8 +76,8 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
     xml::Node folder;
     if (!on([&] {
           Schema& schema = Use(objSchema);
-          folder = schema.AddFolder(relativePath, EncodedFolder(relativePath), parent,
-                                    lngFolderCounter);
+          folder =
+              schema.AddFolder(relativePath, EncodedFolder(relativePath), parent, lngFolderCounter);
         })) {
       return;
     }
@@ -108,8 +108,8 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
       // The record is made before any file is tested: a folder whose files all fail still shows.
       bool recorded = on([&] {
         Schema& schema = Use(objSchema);
-        record = schema.AddFolder(relativePath, EncodedFolder(relativePath), parent,
-                                  lngFolderCounter);
+        record =
+            schema.AddFolder(relativePath, EncodedFolder(relativePath), parent, lngFolderCounter);
       });
       for (const auto& file : *files) {
         if (!recorded) break;

@@ -32,7 +32,7 @@ std::optional<std::string_view> Below(std::string_view real, std::string_view ro
 void Search::NoteSearchedRoot(const std::string& relativePath) {
   try {
     linkNotes_.roots.push_back(
-        {Use(objFSO).RealPath(FullPath(relativePath)), relativePath});
+        {Use(objFSO).RealPath(FullPath(relativePath)), relativePath, read_.recurse});
   } catch (const std::exception&) {
     // A folder that cannot be reached is reported by the walk; no link can lead into it.
   }
@@ -51,7 +51,8 @@ void Search::WriteFolderLinks() {
   for (const auto& [text, target] : notes.links) {
     for (const auto& root : notes.roots) {
       auto rest = Below(target, root.real);
-      if (!rest) continue;
+      // A walk without recursion walks its folder only.
+      if (!rest || (!root.recurse && !rest->empty())) continue;
       std::string relative = root.relative;
       if (!rest->empty()) relative.append(*rest).push_back('\\');
       if (written.insert(text).second) {

@@ -17,8 +17,7 @@ std::string App(const std::string& id, const std::vector<std::string>& files) {
   for (const std::string& file : files) {
     auto words = Words(file);
     text += "<f f_id='" + std::to_string(++fileId) + "' f_name='" + words[0] + "' f_relpath='" +
-            words[1] + "' f_weight='1'><p p_type='2' p_weight='1' p_value='" + words[2] +
-            "'/></f>";
+            words[1] + "' f_weight='1'><p p_type='2' p_weight='1' p_value='" + words[2] + "'/></f>";
   }
   return text + "</v></a>";
 }
@@ -67,14 +66,16 @@ TEST_F(DiskTest, NamesThatDifferOnlyInCaseAreDistinctEverywhere) {
                  App("make", {"Makefile d 3", "makefile d 4"}) + App("doc", {"README x 5"}));
   EXPECT_EQ(Summary(*local_, tree_.Path()),
             "\\Sub\\ a.txt|\\d\\ Makefile makefile|\\sub\\ a.txt|\\x\\ readme");
-  EXPECT_EQ(Found(), "\\Sub\\ one 1:1/1|\\Sub\\ two 1:1/0|\\sub\\ one 1:1/0|\\sub\\ two 1:1/1|"
-                     "\\ make 1:2/2|\\ doc 1:1/1");
+  EXPECT_EQ(Found(),
+            "\\Sub\\ one 1:1/1|\\Sub\\ two 1:1/0|\\sub\\ one 1:1/0|\\sub\\ two 1:1/1|"
+            "\\ make 1:2/2|\\ doc 1:1/1");
 }
 
 // A package split between bin\ (a link to usr\bin, and b2, a link to that link) and usr\sbin is
 // found once, whole, at the root; one that lies only under bin\ at the root, not at usr\, with its
 // file counted once; an application wholly behind a link (current -> 1.2) once, where it really
-// is. A link out of the tree is not noted, and a loop (up -> ..) leads nowhere. Without the option, links stay unseen.
+// is. A link out of the tree is not noted, and a loop (up -> ..) leads nowhere. Without the option,
+// links stay unseen.
 TEST_F(DiskTest, LinksToFoldersPlaceFilesWhereTheLinksPutThem) {
   for (const char* folder : {"usr/bin", "usr/sbin", "opt/app/1.2/lib"}) tree_.AddFolder(folder);
   tree_.AddFile("usr/bin/tar", "tar");
@@ -94,12 +95,14 @@ TEST_F(DiskTest, LinksToFoldersPlaceFilesWhereTheLinksPutThem) {
     links[l.GetAttribute("l_text")->substr(Root().size())] =
         l.GetAttribute("l_target")->substr(Root().size());
   }
-  EXPECT_THAT(links, ::testing::ElementsAre(::testing::Pair("\\b2\\", "\\usr\\bin\\"),
-                                            ::testing::Pair("\\bin\\", "\\usr\\bin\\"),
-                                            ::testing::Pair("\\opt\\app\\current\\",
-                                                            "\\opt\\app\\1.2\\"),
-                                            ::testing::Pair("\\usr\\bin\\up\\", "\\usr\\")));
+  EXPECT_THAT(links,
+              ::testing::ElementsAre(::testing::Pair("\\b2\\", "\\usr\\bin\\"),
+                                     ::testing::Pair("\\bin\\", "\\usr\\bin\\"),
+                                     ::testing::Pair("\\opt\\app\\current\\", "\\opt\\app\\1.2\\"),
+                                     ::testing::Pair("\\usr\\bin\\up\\", "\\usr\\")));
   EXPECT_EQ(Found(), "\\ tar 1:2/2|\\ binonly 1:1/1|\\opt\\app\\1.2\\ js 1:1/1");
+  Locate("d_search_links='1' d_search_recurse='0'", "");  // usr\bin is not walked then
+  EXPECT_TRUE(local_->AsNode().SelectNodes("//m/l").empty());
   Locate("", apps);
   EXPECT_TRUE(local_->AsNode().SelectNodes("//m/l").empty());
   EXPECT_EQ(Found(), "\\usr\\ binonly 1:1/1|\\opt\\app\\1.2\\ js 1:1/1");

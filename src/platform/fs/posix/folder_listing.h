@@ -25,7 +25,8 @@ struct FolderListing {
 // Sorts the entries by d_type, so a plain file or folder costs no call; links and entries of
 // unknown type cost one stat each. A link to a folder is kept apart from the subfolders (a walk
 // never loops); a dangling link is left out. Marks the files, and the subfolders, whose names
-// differ from another's only in letter case. Touches nothing but `folder`'s fixed location, so any thread may list.
+// differ from another's only in letter case. Touches nothing but `folder`'s fixed location, so any
+// thread may list.
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder);
 
 }  // namespace trl::fs::posix
