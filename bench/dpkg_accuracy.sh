@@ -51,18 +51,20 @@ timed import "$trllocator" fingerprint import-dpkg --all --database "$work_dir/f
 # are noted), and each real folder at the top with recursion, but for the kernel's own file
 # systems (/proc, /sys, /dev), which hold no package files. SEARCH replaces all of it.
 entry() {
-  echo "<d d_text=\"$1\" d_search=\"1\" d_search_recurse=\"$2\" d_search_d_attributes=\"35\"" \
+  echo "<d d_id=\"$3\" d_text=\"$1\" d_search=\"1\" d_search_recurse=\"$2\" d_search_d_attributes=\"35\"" \
     "d_search_f_attributes=\"35\" d_search_f_properties=\"0\" d_search_links=\"1\"><d_search_mask/></d>"
 }
 if [[ -n ${SEARCH:-} ]]; then
-  entries=$(entry "$search" True)
+  entries=$(entry "$search" True 1)
 else
-  entries=$(entry '\' False)
+  entries=$(entry '\' False 1)
+  id=1
   for folder in /*/; do
     folder=${folder%/}
     [[ -L $folder ]] && continue
     case $(stat -f -c %T "$folder") in proc | sysfs | tmpfs | devtmpfs | devpts | cgroup*) continue ;; esac
-    entries+=$(entry "\\${folder#/}\\" True)
+    id=$((id + 1))
+    entries+=$(entry "\\${folder#/}\\" True $id)
   done
 fi
 cat >"$work_dir/search-options.xml" <<EOF2

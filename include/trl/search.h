@@ -117,7 +117,8 @@ class Search : public Worker {
   std::string startTime_;  // formatted
   Reading read_;
   bool patternUsable_ = true;  // an invalid pattern is reported once, where it is set
-  bool caseExact_ = false;     // the walk is below a folder that has a case sibling
+  // Where the first folder with a case sibling begins in the folder text of the walk below it.
+  size_t caseExactFrom_ = std::string::npos;
   LinkNotes linkNotes_;
 
   // Built on the first probe of a run: the fingerprint applications by a_id and by a_parent.

@@ -18,10 +18,13 @@ void CandidatePlaces(const FolderFit& fit, const LocalFileIndex& index,
   if (places.empty()) {
     std::string place = fit.AppFolder(record.Folder());
     if (place.empty()) return;
-    // The application folder begins the local folder, letter case aside.
+    // The application folder begins the local folder, letter case aside; it keeps its case when
+    // it holds the folder with a case sibling.
     const std::string& exact = record.ExactFolder();
-    if (record.CaseExact() && exact.size() == record.Folder().size()) {
-      places.push_back({exact.substr(0, place.size()), true});
+    size_t from = record.CaseExactFrom();
+    if (from != std::string::npos && place.size() > from &&
+        exact.size() == record.Folder().size()) {
+      places.push_back({exact.substr(0, place.size()), from});
     } else {
       places.push_back({std::move(place)});
     }

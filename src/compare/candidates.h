@@ -9,11 +9,12 @@
 
 namespace trl {
 
-// An application folder a candidate stands for; `exact` when it keeps the letter case of a folder
-// that has a case sibling, and must be told apart from the sibling's.
+// An application folder a candidate stands for; exact when it holds a folder that has a case
+// sibling, keeps its letter case and must be told apart from the sibling's.
 struct CandidatePlace {
   std::string folder;
-  bool exact = false;
+  size_t exactFrom = std::string::npos;  // where the case-kept part begins
+  bool exact() const { return exactFrom != std::string::npos; }
 };
 
 // The application folders a candidate's file stands for, given where the fingerprint file expects

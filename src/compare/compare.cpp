@@ -261,7 +261,7 @@ void Compare::RecordFind(VersionMatch& match, const LocalFileRecord& record,
     // Keyed by the listed drive rather than its names: a computer listed twice only costs a
     // second find of the same place.
     const void* application = match.v.ParentNode().Id();
-    auto& here = (appFolder.exact ? exactPlacesFound_ : placesFound_)[appFolder.folder];
+    auto& here = (appFolder.exact() ? exactPlacesFound_ : placesFound_)[appFolder.folder];
     auto known = std::find_if(here.begin(), here.end(), [&](const FoundPlace& place) {
       return place.drive == record.DriveIndex() && place.application == application;
     });
@@ -326,9 +326,10 @@ bool Compare::FindPlace(VersionMatch& match, const LocalFileRecord& record,
   found &= on([&] {
     Schema& schema = Use(objSchema);
     const std::string& text = appFolder.folder;
-    match.d = schema.AddFolder(
-        text, appFolder.exact ? schema.EncodeExactName(text) : schema.EncodeName(text), match.m,
-        lngFolderCounter);
+    match.d = schema.AddFolder(text,
+                               appFolder.exact() ? schema.EncodeExactName(text, appFolder.exactFrom)
+                                                 : schema.EncodeName(text),
+                               match.m, lngFolderCounter);
   });
   found &= on([&] {
     match.aResult = Use(objSchema).AddApplication(match.v.ParentNode(), match.d);

@@ -62,8 +62,8 @@ const std::string& LocalFileRecord::ExactFolder() const {
 
 uint32_t LocalFileRecord::FolderIndex() const { return index_->records_[record_].folder; }
 
-bool LocalFileRecord::CaseExact() const {
-  return index_->folders_[index_->records_[record_].folder].caseExact;
+size_t LocalFileRecord::CaseExactFrom() const {
+  return index_->folders_[index_->records_[record_].folder].caseExactFrom;
 }
 
 std::string_view LocalFileRecord::Filename() const {
@@ -109,10 +109,10 @@ const std::vector<FolderAlias>& LocalFileIndex::AliasesOf(const LocalFileRecord&
   return at->second;
 }
 
-void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, bool caseExact) {
+void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, size_t caseExactFrom) {
   if (drives_.empty()) AddDrive("", "", false, "", "");
   folders_.push_back({std::move(folder), std::move(exactFolder),
-                      static_cast<uint32_t>(drives_.size() - 1), caseExact});
+                      static_cast<uint32_t>(drives_.size() - 1), caseExactFrom});
 }
 
 void LocalFileIndex::AddFile(std::string_view filename, std::string_view encodedFilename) {

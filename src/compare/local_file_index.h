@@ -31,8 +31,9 @@ class LocalFileRecord {
   std::string_view EncodedFilename() const;
   // The listed folder the record is in: the same for every record of one folder entry.
   uint32_t FolderIndex() const;
-  // Whether the search told the folder from a case sibling (its encoded name is exact).
-  bool CaseExact() const;
+  // Where, in a folder the search told from a case sibling's, the case-kept part begins (see
+  // Schema::EncodeExactName); npos for any other folder.
+  size_t CaseExactFrom() const;
 
  private:
   friend class LocalFileIndex;
@@ -86,7 +87,8 @@ class LocalFileIndex {
                 std::string drive, std::string encodedDrive);
   // The folder of the records added next, on the last drive added (none yet: an empty one):
   // lower-cased and as written.
-  void AddFolder(std::string folder, std::string exactFolder, bool caseExact = false);
+  void AddFolder(std::string folder, std::string exactFolder,
+                 size_t caseExactFrom = std::string::npos);
   // A record in the last folder added (none yet: an empty one). The encoded name is kept
   // lower-cased and folded, the plain name as given.
   void AddFile(std::string_view filename, std::string_view encodedFilename);
@@ -115,7 +117,7 @@ class LocalFileIndex {
   struct FolderEntry {
     std::string folder, exactFolder;
     uint32_t drive;
-    bool caseExact;
+    size_t caseExactFrom;
   };
   // 16 bytes; the names are in `names_`, each followed by '\0'. The plain name shares the encoded
   // one's text when they are equal, as they mostly are.

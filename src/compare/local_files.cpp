@@ -51,8 +51,7 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
         });
         on([&] { encodedFolder = TextOf(d, vocab::d_name); });
         on([&] {
-          bool exact = Schema::FoldedName(encodedFolder).size() != encodedFolder.size();
-          Use(index).AddFolder(folder, exactFolder, exact);
+          Use(index).AddFolder(folder, exactFolder, Schema::ExactFrom(encodedFolder, exactFolder));
         });
         for (const xml::Node& f : d.ChildElements(vocab::f)) {
           on([&] { filename = TextOf(f, vocab::f_text); });

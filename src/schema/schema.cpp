@@ -159,11 +159,20 @@ std::string Schema::EncodeName(std::string_view text) const {
   return PercentEscaped(LowerCase(text));
 }
 
-std::string Schema::EncodeExactName(std::string_view text) const {
+std::string Schema::EncodeExactName(std::string_view text, size_t from) const {
   std::string encoded = EncodeName(text);
   encoded += kExactMark;
-  encoded += PercentEscaped(std::string(text));
+  encoded += PercentEscaped(std::string(text.substr(std::min(from, text.size()))));
   return encoded;
+}
+
+size_t Schema::ExactFrom(std::string_view encoded, std::string_view text) {
+  size_t mark = encoded.find(kExactMark);
+  if (mark == std::string_view::npos) return std::string_view::npos;
+  std::string_view kept = encoded.substr(mark + kExactMark.size());
+  // Each "%" of the kept part begins an escape of one byte in three.
+  size_t length = kept.size() - 2 * static_cast<size_t>(std::count(kept.begin(), kept.end(), '%'));
+  return text.size() - std::min(length, text.size());
 }
 
 std::string_view Schema::FoldedName(std::string_view encoded) {

@@ -27,9 +27,11 @@ class Schema {
   // names give equal output, and every output can stand between apostrophes in a selection.
   std::string EncodeName(std::string_view text) const;
   // The encoded name of an item whose name differs from a sibling's only in letter case, so that
-  // the two are told apart: EncodeName, "%~" and the name with its case kept, escaped alike.
-  // No output of EncodeName holds "%~".
-  std::string EncodeExactName(std::string_view text) const;
+  // the two are told apart: EncodeName, "%~" and the text from `from` (where the sibling's name
+  // begins in a path) with its case kept, escaped alike. No output of EncodeName holds "%~".
+  std::string EncodeExactName(std::string_view text, size_t from = 0) const;
+  // Where the case-kept part of an exact encoding of `text` begins; npos for an ordinary one.
+  static size_t ExactFrom(std::string_view encoded, std::string_view text);
   // The output of EncodeName that an encoded name, exact or not, was made from.
   static std::string_view FoldedName(std::string_view encoded);
 

@@ -138,10 +138,12 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
                 sibling = subFolder->HasCaseSibling();
               }) &&
               !name.empty()) {
-            bool outer = std::exchange(caseExact_, caseExact_ || sibling);
+            // Below the first folder with a case sibling, folders are told apart from there on.
+            size_t outer = caseExactFrom_;
+            if (sibling && outer == std::string::npos) caseExactFrom_ = relativePath.size();
             FindFiles(subPath, parent, relativePath + name + "\\", recurse, folderMask, fileMask,
                       properties);
-            caseExact_ = outer;
+            caseExactFrom_ = outer;
           }
           if (status_ == kStatusCancelled) return;
         }
@@ -153,7 +155,8 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
 
 std::string Search::EncodedFolder(const std::string& relativePath) const {
   Schema& schema = Use(objSchema);
-  return caseExact_ ? schema.EncodeExactName(relativePath) : schema.EncodeName(relativePath);
+  return caseExactFrom_ != std::string::npos ? schema.EncodeExactName(relativePath, caseExactFrom_)
+                                             : schema.EncodeName(relativePath);
 }
 
 bool Search::AddFile(xml::Node folder, const fs::File& file, int16_t properties) {

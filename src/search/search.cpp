@@ -83,7 +83,7 @@ void Search::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicat
   read_ = Reading{};
   on([&] { Use(objRegExp).Pattern(""); });
   patternUsable_ = true;
-  caseExact_ = false;
+  caseExactFrom_ = std::string::npos;
   linkNotes_ = {};
   applicationsById_.reset();
 }

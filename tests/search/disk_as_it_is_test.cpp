@@ -54,7 +54,8 @@ class DiskTest : public SearchTest {
 };
 
 // Sub and sub, Makefile and makefile: four files, each recorded, each read from its own inode
-// (told by its size), each a candidate of a lookup in any case; README is found as readme.
+// (told by its size), each a candidate of a lookup in any case; README is found as readme. An
+// application above the folders with a case sibling is one, whole.
 TEST_F(DiskTest, NamesThatDifferOnlyInCaseAreDistinctEverywhere) {
   for (const char* folder : {"Sub", "sub", "d", "x"}) tree_.AddFolder(folder);
   tree_.AddFile("Sub/a.txt", "1");
@@ -63,12 +64,13 @@ TEST_F(DiskTest, NamesThatDifferOnlyInCaseAreDistinctEverywhere) {
   tree_.AddFile("d/makefile", "4444");
   tree_.AddFile("x/readme", "55555");
   Locate("", App("one", {"a.txt \\ 1"}) + App("two", {"A.TXT \\ 2"}) +
-                 App("make", {"Makefile d 3", "makefile d 4"}) + App("doc", {"README x 5"}));
+                 App("make", {"Makefile d 3", "makefile d 4"}) + App("doc", {"README x 5"}) +
+                 App("whole", {"a.txt Sub 1", "README x 5"}));
   EXPECT_EQ(Summary(*local_, tree_.Path()),
             "\\Sub\\ a.txt|\\d\\ Makefile makefile|\\sub\\ a.txt|\\x\\ readme");
   EXPECT_EQ(Found(),
             "\\Sub\\ one 1:1/1|\\Sub\\ two 1:1/0|\\sub\\ one 1:1/0|\\sub\\ two 1:1/1|"
-            "\\ make 1:2/2|\\ doc 1:1/1");
+            "\\ make 1:2/2|\\ doc 1:1/1|\\ whole 1:2/2");
 }
 
 // A package split between bin\ (a link to usr\bin, and b2, a link to that link) and usr\sbin is
