@@ -24,6 +24,7 @@ long NumberOf(const xml::Node& node, std::string_view attribute) {
 struct PlacedFile {
   std::string relpath, name;
   int weight = 1;
+  bool documentation = false;  // and neither a conffile nor shared
   const PackageFile* file;
   std::optional<uint64_t> size;
 };
@@ -122,8 +123,14 @@ void PackageImporter::AddFiles(xml::Node v, const PackageVersion& version) {
     auto [relpath, name] = SplitPlace(path);
     auto owner = owners_.find(file.path);
     bool shared = owner != owners_.end() && owner->second != version.Instance();
-    bool weightless = file.conffile || shared || IsDocumentationPath(file.path);
-    PlacedFile entry{std::move(relpath), std::move(name), weightless ? 0 : 1, &file, file.size};
+    bool documentation = IsDocumentationPath(file.path);
+    bool weightless = file.conffile || shared || documentation;
+    PlacedFile entry{std::move(relpath),
+                     std::move(name),
+                     weightless ? 0 : 1,
+                     documentation && !file.conffile && !shared,
+                     &file,
+                     file.size};
     if (version.installed && !file.conffile) {
       struct stat info {};
       if (::stat((root_ + "/" + path).c_str(), &info) == 0 && S_ISREG(info.st_mode)) {
@@ -133,6 +140,11 @@ void PackageImporter::AddFiles(xml::Node v, const PackageVersion& version) {
       }
     }
     placed.push_back(std::move(entry));
+  }
+  // A package of documentation only (a metapackage, a package of translations) is known by its
+  // documentation: a version in which nothing weighs could never be scored.
+  if (std::none_of(placed.begin(), placed.end(), [](const PlacedFile& p) { return p.weight; })) {
+    for (PlacedFile& entry : placed) entry.weight = entry.documentation ? 1 : 0;
   }
   std::sort(placed.begin(), placed.end(), [](const PlacedFile& x, const PlacedFile& y) {
     return std::tie(x.relpath, x.name) < std::tie(y.relpath, y.name);

@@ -74,12 +74,14 @@ class ImportDpkgTest : public ::testing::Test {
                       kAbc + "\n /etc/old.conf " + kEmpty +
                       " obsolete\n\nPackage: gone\nStatus: deinstall ok config-files\n"
                       "Version: 1\n\nPackage: other\nStatus: install ok installed\n"
-                      "Architecture: amd64\nMulti-Arch: same\nVersion: 2\n");
+                      "Architecture: amd64\nMulti-Arch: same\nVersion: 2\n\nPackage: tool-doc\n"
+                      "Status: install ok installed\nVersion: 1\n");
     tree_.AddFile("admin/info/tool.md5sums", kA + "  usr/bin/tool\n" + kA + "  usr/bin/helper\n" +
                                                  kA + "  usr/lib/shared.so\n" + kA +
                                                  "  usr/share/doc/tool/copyright\n" + kA +
                                                  "  usr/bin/missing\n" + kA + "  etc/tool.conf\n");
     tree_.AddFile("admin/info/other:amd64.md5sums", kEmpty + "  usr/lib/shared.so\n");
+    tree_.AddFile("admin/info/tool-doc.md5sums", kA + "  usr/share/man/man1/tool.1.gz\n");
     tree_.AddFile("admin/diversions", "/usr/bin/helper\n/usr/bin/helper.tool\nother\n");
     for (const char* file : {"usr/bin/tool", "usr/bin/helper.tool", "usr/lib/shared.so",
                              "usr/share/doc/tool/copyright", "etc/tool.conf"})
@@ -164,8 +166,12 @@ TEST_F(ImportDpkgTest, InstalledAndArchivedVersionsKeepTheirIdsAndFollowDebianOr
   EXPECT_EQ(testing::ValuesOf(*second, "/*/a", "a_id"), (Strings{"7", "8", "9"}));
   EXPECT_EQ(second->AsNode().SelectSingleNode("//a[@a_id='8']").Xml(),
             first->AsNode().SelectSingleNode("//a[@a_id='8']").Xml());
-  // The file both packages list weighs 0 for "other" too.
+  // The file both packages list weighs 0 for "other" too; a package of documentation only is
+  // known by its documentation.
   EXPECT_EQ(testing::ValuesOf(*second, "//a[@a_id='9']/v/f", "f_weight"), Strings{"0"});
+  ASSERT_EQ(Import("tool-doc").first, kExitOk);
+  EXPECT_EQ(testing::ValuesOf(*Database(), "//a[@a_name='tool-doc']/v/f", "f_weight"),
+            Strings{"1"});
 }
 
 TEST_F(ImportDpkgTest, BadRequestsSayWhatIsWrongAndWriteNothing) {
