@@ -4,9 +4,12 @@
 #include <gtest/gtest.h>
 
 #include <climits>
+#include <cstdlib>
+#include <ctime>
 #include <limits>
 #include <string>
 
+#include "platform/clock.h"
 #include "platform/failure.h"
 
 namespace trl {
@@ -76,6 +79,30 @@ TEST(ConvertTest, CheckedAdditions) {
   EXPECT_EQ(Result([] { return CheckedAdd(INT32_MIN, INT32_MAX); }), "-1");
   EXPECT_EQ(Result([] { return CheckedAdd(INT32_MAX, 1); }), "#6");
   EXPECT_EQ(Result([] { return CheckedAdd16(-32768, -1); }), "#6");
+}
+
+// The accepted forms are written in one; anything else is a type mismatch.
+TEST(ClockTest, ReadsTheAcceptedFormsOnlyAndWritesOne) {
+  const auto written = [](const char* text) {
+    return Result([&] { return FormatDateTime(ToDateTime(text)); });
+  };
+  const std::pair<const char*, const char*> cases[] = {
+      {"2023-01-05 10:30:15", "2023-01-05 10:30:15"},
+      {"2023/01/05T10:30", "2023-01-05 10:30:00"},
+      {"  2024-02-29 23:59:59 ", "2024-02-29 23:59:59"},
+      {"2000-02-29", "2000-02-29 00:00:00"},
+      {"0987-6-5 4:3:2", "0987-06-05 04:03:02"}};
+  for (const auto& [text, expected] : cases) EXPECT_EQ(written(text), expected) << text;
+  for (const char* text :
+       {"2023-02-29", "1900-02-29", "2023-04-31", "2023-13-01", "2023-01-00", "2023-01-05 24:00:00",
+        "2023-01-05 10:60", "2023-01-05 10:30:60", "yesterday", "", "2023-01-05 10", "2023-01/05",
+        "23-01-05", "0099-01-01", "2023-01-05T", "2023-01-05 10:30:15x", "2023-001-05",
+        "2023-01-05 10:30:"}) {
+    EXPECT_EQ(written(text), "#13") << text;
+  }
+  setenv("TZ", "<+02>-2", 1);  // a POSIX rule: no zone database needed
+  tzset();
+  EXPECT_EQ(FormatDateTime(FromTimeT(951782400)), "2000-02-29 02:00:00");
 }
 
 }  // namespace

@@ -47,20 +47,19 @@ class ListingReadAheadTest : public ::testing::Test {
 // back), each folder gets the listing a direct readdir gives; small limits keep the read-ahead
 // stopping and starting again.
 TEST_F(ListingReadAheadTest, EveryFolderGetsItsOwnListingWhateverTheWalk) {
+  // A walk passes over folders named "?1" with everything below them, takes an unrelated folder
+  // after every so many folders (0: never), takes each folder a second time.
   struct Case {
     const char* walk;
-    bool skipOnes;  // pass over folders named "?1" with everything below them
-    int jumpEvery;  // take an unrelated folder after every so many folders (0: never)
-    bool twice;     // take each folder a second time
+    bool skipOnes;
+    int jumpEvery;
+    bool twice;
     size_t maxFolders, maxEntries;
-  };
-  const Case cases[] = {
-      {"depth first", false, 0, false, 128, 1 << 15},
-      {"depth first, small limits", false, 0, false, 2, 5},
-      {"passing subtrees by", true, 0, false, 4, 1 << 15},
-      {"jumping away and back", false, 7, false, 3, 1 << 15},
-      {"everything twice", true, 0, true, 3, 8},
-  };
+  } const cases[] = {{"depth first", false, 0, false, 128, 1 << 15},
+                     {"depth first, small limits", false, 0, false, 2, 5},
+                     {"passing subtrees by", true, 0, false, 4, 1 << 15},
+                     {"jumping away and back", false, 7, false, 3, 1 << 15},
+                     {"everything twice", true, 0, true, 3, 8}};
   for (const Case& c : cases) {
     SCOPED_TRACE(c.walk);
     ListingReadAhead readAhead(c.maxFolders, c.maxEntries);
@@ -71,9 +70,7 @@ TEST_F(ListingReadAheadTest, EveryFolderGetsItsOwnListingWhateverTheWalk) {
           std::string expected = Summary(ListFolder(folder));
           FolderListing listing = readAhead.Take(folder);
           ASSERT_EQ(Summary(listing), expected) << folder->Native();
-          if (c.twice) {
-            ASSERT_EQ(Summary(readAhead.Take(folder)), expected);
-          }
+          if (c.twice) ASSERT_EQ(Summary(readAhead.Take(folder)), expected);
           if (c.jumpEvery != 0 && ++taken % c.jumpEvery == 0) {
             auto elsewhere = std::make_shared<FolderPlace>(tree_.Native("a2/b3"), "");
             ASSERT_EQ(Summary(readAhead.Take(elsewhere)), Summary(ListFolder(elsewhere)));
