@@ -41,19 +41,6 @@ inline std::vector<std::string> ValuesOf(xml::Document& document, std::string_vi
   return values;
 }
 
-// The events a run appended to its results.
-inline std::vector<ReportedEvent> EventsIn(xml::Document& document) {
-  std::vector<ReportedEvent> events;
-  for (const xml::Node& e : document.AsNode().SelectNodes("/*/events/event")) {
-    events.push_back(
-        {std::stoi(e.GetAttribute("number").value_or("0")),
-         std::stoi(e.GetAttribute("kind").value_or("0")), e.GetAttribute("class").value_or(""),
-         e.GetAttribute("procedure").value_or(""), e.GetAttribute("description").value_or(""),
-         e.GetAttribute("source").value_or("")});
-  }
-  return events;
-}
-
 inline std::string Lower(std::string text) {
   for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
   return text;
