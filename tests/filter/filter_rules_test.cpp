@@ -1,6 +1,9 @@
 // The versions a synchronous run keeps, their labels, and each application's verdict.
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include <regex>
 
 #include "filter/filter_fixture.h"
 
@@ -12,22 +15,13 @@ using ::testing::IsEmpty;
 
 using FilterRulesTest = FilterTest;
 
-std::string Joined(const std::vector<std::string>& words, std::string_view absent = "<absent>") {
-  std::string text;
-  for (const std::string& word : words) {
-    text += (text.empty() ? "" : " ") + (word == "<absent>" ? std::string(absent) : word);
-  }
-  return text;
-}
-
 // "left v_ids|their v_guess (_: absent)|a_manage[ v_id v_seq|v_name]" of the only application.
 std::string Outcome(xml::Document& d, bool verdict = true) {
-  std::string text = Joined(ValuesOf(d, "//a/v", "v_id")) + "|" +
-                     Joined(ValuesOf(d, "//a/v", "v_guess"), "_") + "|" +
-                     ValuesOf(d, "//a", "a_manage")[0];
-  if (!verdict) return text;
-  return text + " " + ValuesOf(d, "//a", "v_id")[0] + " " + ValuesOf(d, "//a", "v_seq")[0] + "|" +
-         ValuesOf(d, "//a", "v_name")[0];
+  auto a = [&](const char* name) { return ValuesOf(d, "//a", name)[0]; };
+  std::string text = fmt::format("{}|{}|{}", fmt::join(ValuesOf(d, "//a/v", "v_id"), " "),
+                                 fmt::join(ValuesOf(d, "//a/v", "v_guess"), " "), a("a_manage"));
+  text = std::regex_replace(text, std::regex("<absent>"), "_");
+  return verdict ? text + " " + a("v_id") + " " + a("v_seq") + "|" + a("v_name") : text;
 }
 
 TEST_F(FilterRulesTest, RulesKeepAndLabelVersionsAndTheApplicationTakesTheVerdict) {

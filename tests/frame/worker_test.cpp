@@ -86,12 +86,6 @@ class WorkerTest : public ::testing::Test {
   std::string lastUpdate, lastResults;
 };
 
-TEST_F(WorkerTest, SynchronousStartRunsAtOnce) {
-  worker.Asynchronous(false);
-  EXPECT_EQ(worker.Start(), "<results/>");
-  EXPECT_EQ(worker.runs, 1);
-}
-
 TEST_F(WorkerTest, AsynchronousRunReportsInOrderAndRefusesAnotherStart) {
   onEvent = [&](const std::string& e) {
     if (e != "S3") EXPECT_EQ(worker.Start(), "");  // refused while started or running

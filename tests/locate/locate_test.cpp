@@ -1,5 +1,6 @@
 #include "trl/locate.h"
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 
 #include <algorithm>
@@ -69,16 +70,14 @@ class LocateTest : public ::testing::Test {
   // Alpha in two releases told apart by the size of alpha.exe, and Beta in one; `more` joins the
   // properties of Alpha 2.0's file.
   static xml::DocumentPtr Fingerprint(const std::string& more = "") {
-    auto version = [](const char* id, const char* name, const char* file, int size,
-                      const std::string& properties = "") {
-      return std::string(R"(<v v_id=")") + id + R"(" v_name=")" + name + R"(" v_seq=")" + id +
-             R"("><f f_id="1" f_name=")" + file + R"(" f_relpath="" f_weight="1"><p p_type="2")" +
-             R"( p_weight="1" p_value=")" + std::to_string(size) + R"("/>)" + properties +
-             "</f></v>";
-    };
-    return Parse(R"(<fp><a a_id="1" a_name="Alpha">)" + version("1", "1.0", "alpha.exe", 9) +
-                 version("2", "2.0", "alpha.exe", 11, more) + R"(</a><a a_id="2" a_name="Beta">)" +
-                 version("1", "5.0", "beta.exe", 4) + "</a></fp>");
+    constexpr const char* kVersion =
+        R"(<v v_id="{0}" v_name="{1}" v_seq="{0}"><f f_id="1" f_name="{2}" f_relpath="" )"
+        R"(f_weight="1"><p p_type="2" p_weight="1" p_value="{3}"/>{4}</f></v>)";
+    return Parse(fmt::format(R"(<fp><a a_id="1" a_name="Alpha">{}{}</a><a a_id="2" a_name="Beta">)"
+                             "{}</a></fp>",
+                             fmt::format(kVersion, 1, "1.0", "alpha.exe", 9, ""),
+                             fmt::format(kVersion, 2, "2.0", "alpha.exe", 11, more),
+                             fmt::format(kVersion, 1, "5.0", "beta.exe", 4, "")));
   }
 
   // The search options: the Apps folder and everything below it, plus `managed` entries.

@@ -174,14 +174,10 @@ std::string SearchOptions(const Run& run, Generator& g) {
   return text + "</options>";
 }
 
-std::string ApplicationOptions(const Run& run) {
-  std::string text = "<options>";
-  for (int id : run.rejected) text += "<a a_id='" + N(id) + "' a_selected='0'/>";
-  return text + "</options>";
-}
+std::string PathOf(const Key& key) { return Names(key) + "/a[@a_id='" + N(key[3]) + "']"; }
 
 xml::Node At(xml::Document& document, const App& app) {
-  return document.AsNode().SelectSingleNode(Names(app.key) + "/a[@a_id='" + N(app.key[3]) + "']");
+  return document.AsNode().SelectSingleNode(PathOf(app.key));
 }
 
 // How often each outcome came up, so that the generator is seen to reach them all.
@@ -199,7 +195,9 @@ void CheckRun(uint32_t trial, Seen& seen) {
   std::map<Key, std::string> before;
   for (const auto& [key, app] : run.old) before[key] = Content(At(*old, app));
 
-  ASSERT_TRUE(MergeNow(Parse(SearchOptions(run, g)), Parse(ApplicationOptions(run)), old, fresh)
+  std::string rejected = "<options>";
+  for (int id : run.rejected) rejected += "<a a_id='" + N(id) + "' a_selected='0'/>";
+  ASSERT_TRUE(MergeNow(Parse(SearchOptions(run, g)), Parse(rejected + "</options>"), old, fresh)
                   .events.empty());
   EXPECT_EQ(fresh->AsNode().CountNodes("//a"), 0u);
 
@@ -221,9 +219,7 @@ void CheckRun(uint32_t trial, Seen& seen) {
       std::vector<std::string> history;
       for (int v : o.history) history.push_back(N(v));
       if (*fresher.vId != oldId && oldId != 0) history.push_back(N(o.firstVersion));
-      std::vector<std::string> actual;
-      for (const xml::Node& v : now.SelectNodes("v_history/v"))
-        actual.push_back(*v.GetAttribute("v_id"));
+      auto actual = ValuesOf(*old, PathOf(key) + "/v_history/v", "v_id");
       EXPECT_EQ(actual, history) << "history of " << key[3];
       ++seen.replaced;
       if (actual.size() > o.history.size()) {
@@ -256,13 +252,9 @@ void CheckRun(uint32_t trial, Seen& seen) {
   }
   EXPECT_EQ(old->AsNode().CountNodes("//d/a"), kept + run.fresh.size());
 
-  std::multiset<std::string> listed;
-  for (const xml::Node& copy : old->AsNode().SelectNodes("/*/a_missing/a")) {
-    listed.insert(*copy.GetAttribute("a_id"));
-    EXPECT_EQ(copy.GetAttribute("a_manage"), "0");
-    EXPECT_EQ(copy.GetAttribute("a_missing"), "1");
-  }
-  EXPECT_EQ(listed, missing);
+  auto listed = ValuesOf(*old, "/*/a_missing/a", "a_id");
+  EXPECT_EQ(std::multiset<std::string>(listed.begin(), listed.end()), missing);
+  EXPECT_EQ(old->AsNode().CountNodes("//a_missing/a[not(@a_manage='0' and @a_missing='1')]"), 0u);
   EXPECT_EQ(old->AsNode().CountNodes("/*/a_missing"), missing.empty() ? 0u : 1u);
   // Pruning leaves no empty folder or drive; an emptied computer stays only beside others.
   EXPECT_EQ(old->AsNode().CountNodes("//d[not(a)] | //m[not(d)]"), 0u);

@@ -2,9 +2,10 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cctype>
+#include <iterator>
 #include <memory>
+#include <sstream>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -23,12 +24,8 @@ inline xml::DocumentPtr Parse(std::string_view text) {
 
 // The words of `text`, for short tables.
 inline std::vector<std::string> Words(std::string_view text) {
-  std::vector<std::string> words;
-  for (size_t start = 0, end = 0; start < text.size(); start = end + 1) {
-    end = std::min(text.find(' ', start), text.size());
-    if (end > start) words.emplace_back(text.substr(start, end - start));
-  }
-  return words;
+  std::istringstream in{std::string(text)};
+  return {std::istream_iterator<std::string>(in), {}};
 }
 
 // The values of `attribute` on what `xpath` selects, in document order.
@@ -39,19 +36,6 @@ inline std::vector<std::string> ValuesOf(xml::Document& document, std::string_vi
     values.push_back(node.GetAttribute(attribute).value_or("<absent>"));
   }
   return values;
-}
-
-// The events a run appended to its results.
-inline std::vector<ReportedEvent> EventsIn(xml::Document& document) {
-  std::vector<ReportedEvent> events;
-  for (const xml::Node& e : document.AsNode().SelectNodes("/*/events/event")) {
-    events.push_back(
-        {std::stoi(e.GetAttribute("number").value_or("0")),
-         std::stoi(e.GetAttribute("kind").value_or("0")), e.GetAttribute("class").value_or(""),
-         e.GetAttribute("procedure").value_or(""), e.GetAttribute("description").value_or(""),
-         e.GetAttribute("source").value_or("")});
-  }
-  return events;
 }
 
 inline std::string Lower(std::string text) {

@@ -13,8 +13,8 @@
 namespace trl::testing {
 
 // A FileSystem that passes every call to another one, except the calls it was told to fail, and
-// counts the calls of each kind so a test can check that no unneeded work was done. Folders and
-// files it hands out are wrapped too, so listing a folder or opening a file can fail as well.
+// counts the calls of each kind so a test can check that no unneeded work was done. Files it hands
+// out are wrapped too, so opening one can fail as well; folders are passed through.
 // Paths match regardless of case, of "/" for "\" and of a trailing separator.
 class FaultInjectingFileSystem : public fs::FileSystem {
  public:
@@ -23,7 +23,6 @@ class FaultInjectingFileSystem : public fs::FileSystem {
     kFolderExists,
     kGetFile,
     kGetFolder,
-    kListFolder,  // Files or SubFolders of a folder
     kOpenFile,
   };
 
@@ -40,13 +39,13 @@ class FaultInjectingFileSystem : public fs::FileSystem {
   std::unique_ptr<fs::Folder> GetFolder(std::string_view path) override;
   std::string RealPath(std::string_view path) override { return target_.RealPath(path); }
 
-  // Counts `operation` and fails it when a rule says so; for the wrapped folders and files.
+  // Counts `operation` and fails it when a rule says so; for the wrapped files.
   void Enter(Operation operation, std::string_view path);
 
  private:
   fs::FileSystem& target_;
   std::map<std::pair<Operation, std::string>, int32_t> failures_;
-  std::array<int, 6> calls_{};
+  std::array<int, 5> calls_{};
 };
 
 }  // namespace trl::testing

@@ -3,25 +3,27 @@
 #include <gtest/gtest.h>
 
 #include "frame/error_handler.h"
-#include "trl/xml.h"
 
 namespace trl::testing {
 
-std::vector<ReportedEvent> TakeReportedEvents() {
+std::vector<ReportedEvent> EventsIn(xml::Document& document, std::string_view xpath) {
   std::vector<ReportedEvent> events;
+  for (const xml::Node& e : document.AsNode().SelectNodes(xpath)) {
+    auto text = [&](const char* name) { return e.GetAttribute(name).value_or(""); };
+    events.push_back({std::stoi(e.GetAttribute("number").value_or("0")),
+                      std::stoi(e.GetAttribute("kind").value_or("0")), text("class"),
+                      text("procedure"), text("description"), text("source")});
+  }
+  return events;
+}
+
+std::vector<ReportedEvent> TakeReportedEvents() {
   Reporter* reporter = SharedReporter();
-  if (reporter == nullptr) return events;
+  if (reporter == nullptr) return {};
   xml::Document document;
   EXPECT_TRUE(document.LoadXml(reporter->EventsXML()));
-  for (xml::Node e : document.AsNode().SelectNodes("//event")) {
-    events.push_back(
-        {std::stoi(e.GetAttribute("number").value_or("0")),
-         std::stoi(e.GetAttribute("kind").value_or("0")), e.GetAttribute("class").value_or(""),
-         e.GetAttribute("procedure").value_or(""), e.GetAttribute("description").value_or(""),
-         e.GetAttribute("source").value_or("")});
-  }
   reporter->ClearEvents();
-  return events;
+  return EventsIn(document, "//event");
 }
 
 }  // namespace trl::testing

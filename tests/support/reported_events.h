@@ -2,7 +2,10 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
+
+#include "trl/xml.h"
 
 namespace trl::testing {
 
@@ -17,6 +20,10 @@ struct ReportedEvent {
 
   bool operator==(const ReportedEvent&) const = default;
 };
+
+// The events `xpath` selects, by default those a run appended to its results.
+std::vector<ReportedEvent> EventsIn(xml::Document& document,
+                                    std::string_view xpath = "/*/events/event");
 
 // The events the thread's shared reporter holds (none when it does not exist), then clears them.
 std::vector<ReportedEvent> TakeReportedEvents();

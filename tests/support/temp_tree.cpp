@@ -55,16 +55,8 @@ std::string TempTree::Native(std::string_view relative) const {
 
 std::string TempTree::Path(std::string_view relative) const {
   std::string path;
-  std::string native = Native(relative);
-  size_t start = 1;  // past the root's "/"
-  while (start <= native.size()) {
-    size_t end = native.find('/', start);
-    if (end == std::string::npos) end = native.size();
-    if (end > start) {
-      path += '\\';
-      path += NameFromNative(std::string_view(native).substr(start, end - start));
-    }
-    start = end + 1;
+  for (const stdfs::path& part : stdfs::path(Native(relative)).relative_path()) {
+    if (!part.empty()) path += '\\' + NameFromNative(part.native());
   }
   return path;
 }
