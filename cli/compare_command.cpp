@@ -19,9 +19,9 @@ struct CompareOptions {
 
 int RunCompare(const CompareOptions& options) {
   auto applicationOptions =
-      LoadOptionalDocumentFile(options.applicationOptions, "application options");
-  auto localFiles = LoadDocumentFile(options.localFiles, "local-files document");
-  auto fingerprint = LoadDocumentFile(options.fingerprint, "fingerprint database");
+      LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
+  auto localFiles = LoadDocumentFile(options.localFiles, kLocalFilesRole);
+  auto fingerprint = LoadDocumentFile(options.fingerprint, kFingerprintRole);
 
   ReportPrinter printer;
   Compare compare(FileSystemWithShares(options.stage.shares));

@@ -18,7 +18,8 @@ std::string SystemReason(int error) { return std::strerror(error); }
 
 }  // namespace
 
-xml::DocumentPtr LoadDocumentFile(const std::string& path, std::string_view role) {
+xml::DocumentPtr LoadDocumentFile(const std::string& path, const DocumentRole& documentRole) {
+  std::string_view role = documentRole.name;
   // Opened here first, so that a missing or unreadable file gets the system's own reason.
   std::error_code ignored;
   if (std::filesystem::is_directory(path, ignored)) {
@@ -28,6 +29,9 @@ xml::DocumentPtr LoadDocumentFile(const std::string& path, std::string_view role
   std::ifstream probe(path, std::ios::binary);
   if (!probe) {
     throw CommandError(fmt::format("cannot read the {} '{}': {}", role, path, SystemReason(errno)));
+  }
+  if (probe.peek() == std::ifstream::traits_type::eof()) {
+    throw CommandError(fmt::format("the {} '{}' is empty", role, path));
   }
   probe.close();
   auto document = std::make_shared<xml::Document>();
@@ -42,10 +46,11 @@ xml::DocumentPtr LoadDocumentFile(const std::string& path, std::string_view role
   if (!document->DocumentElement()) {
     throw CommandError(fmt::format("the {} '{}' holds no XML element", role, path));
   }
+  RequireKind(*document, path, documentRole);
   return document;
 }
 
-xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, std::string_view role) {
+xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const DocumentRole& role) {
   return path.empty() ? nullptr : LoadDocumentFile(path, role);
 }
 

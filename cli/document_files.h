@@ -3,15 +3,17 @@
 #include <string>
 #include <string_view>
 
+#include "document_kind.h"
 #include "trl/xml.h"
 
 namespace trl::cli {
 
-// Loads the XML document at `path`; `role` names it in messages ("search options"). A file that
-// is missing or unreadable, or not well-formed XML (with line and column), is a CommandError.
-xml::DocumentPtr LoadDocumentFile(const std::string& path, std::string_view role);
+// Loads the XML document at `path` for `role`, which names it in messages. A file that is missing,
+// unreadable or empty, not well-formed XML (with line and column), or of a kind the role does not
+// accept is a CommandError.
+xml::DocumentPtr LoadDocumentFile(const std::string& path, const DocumentRole& role);
 // The same, or null when `path` is empty (the option was not given).
-xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, std::string_view role);
+xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const DocumentRole& role);
 
 // Writes `text` and a line end to the file at `path`, or to standard output when `path` is empty.
 // A file that cannot be written is a CommandError with exit code kExitFailed.

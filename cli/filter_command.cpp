@@ -19,7 +19,7 @@ struct FilterOptions {
 
 int RunFilter(const FilterOptions& options) {
   int16_t filterOptions = ParseFilterOptions(options.filter);
-  auto matches = LoadDocumentFile(options.matches, "matches document");
+  auto matches = LoadDocumentFile(options.matches, kResultsRole);
 
   ReportPrinter printer;
   Filter filter;

@@ -38,7 +38,7 @@ xml::DocumentPtr LoadOrCreateDatabase(const std::string& path) {
   if (!std::filesystem::exists(std::filesystem::symlink_status(path, error))) {
     return std::make_shared<xml::Document>();
   }
-  return LoadDocumentFile(path, "fingerprint database");
+  return LoadDocumentFile(path, kFingerprintRole);
 }
 
 xml::Node DatabaseRoot(xml::Document& database) {

@@ -57,14 +57,14 @@ Documents LoadDocuments(const LocateOptions& options) {
       }
       return path;
     };
-    return {LoadDocumentFile(example("search-options.xml"), "search options"),
-            LoadDocumentFile(example("application-options.xml"), "application options"),
-            LoadDocumentFile(example("fingerprint.xml"), "fingerprint database"), nullptr};
+    return {LoadDocumentFile(example("search-options.xml"), kSearchOptionsRole),
+            LoadDocumentFile(example("application-options.xml"), kApplicationOptionsRole),
+            LoadDocumentFile(example("fingerprint.xml"), kFingerprintRole), nullptr};
   }
-  return {LoadOptionalDocumentFile(options.searchOptions, "search options"),
-          LoadOptionalDocumentFile(options.applicationOptions, "application options"),
-          LoadOptionalDocumentFile(options.fingerprint, "fingerprint database"),
-          LoadOptionalDocumentFile(options.userData, "user data")};
+  return {LoadOptionalDocumentFile(options.searchOptions, kSearchOptionsRole),
+          LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole),
+          LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole),
+          LoadOptionalDocumentFile(options.userData, kUserDataRole)};
 }
 
 int Attribute(const std::string& updateXml, std::string_view name) {

@@ -19,11 +19,11 @@ struct MergeOptions {
 };
 
 int RunMerge(const MergeOptions& options) {
-  auto searchOptions = LoadDocumentFile(options.searchOptions, "search options");
+  auto searchOptions = LoadDocumentFile(options.searchOptions, kSearchOptionsRole);
   auto applicationOptions =
-      LoadOptionalDocumentFile(options.applicationOptions, "application options");
-  auto userData = LoadDocumentFile(options.userData, "user data");
-  auto newResults = LoadDocumentFile(options.newResults, "new results");
+      LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
+  auto userData = LoadDocumentFile(options.userData, kUserDataRole);
+  auto newResults = LoadDocumentFile(options.newResults, kNewResultsRole);
 
   ReportPrinter printer;
   Merge merge;

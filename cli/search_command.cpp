@@ -19,11 +19,11 @@ struct SearchOptions {
 };
 
 int RunSearch(const SearchOptions& options) {
-  auto searchOptions = LoadDocumentFile(options.searchOptions, "search options");
+  auto searchOptions = LoadDocumentFile(options.searchOptions, kSearchOptionsRole);
   auto applicationOptions =
-      LoadOptionalDocumentFile(options.applicationOptions, "application options");
-  auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, "fingerprint database");
-  auto results = LoadOptionalDocumentFile(options.results, "results document");
+      LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
+  auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
+  auto results = LoadOptionalDocumentFile(options.results, kLocalFilesRole);
 
   ReportPrinter printer;
   Search search(FileSystemWithShares(options.stage.shares));

@@ -1,0 +1,106 @@
+#include "document_kind.h"
+
+#include <gtest/gtest.h>
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <fstream>
+#include <iterator>
+
+#include "command_error.h"
+#include "document_files.h"
+#include "fingerprint_command.h"
+#include "locate_command.h"
+#include "support/documents.h"
+#include "support/temp_tree.h"
+
+namespace trl::cli {
+namespace {
+
+TEST(DocumentKindTest, EachKindIsToldByItsRootAndWhatLiesBelowIt) {
+  using K = DocumentKind;
+  const std::pair<const char*, DocumentKind> cases[] = {
+      {"<o><c><m><d><a a_manage='1'/></d></m></c></o>", K::kSearchOptions},
+      {"<trl_applicationoptions/>", K::kApplicationOptions},
+      {"<o a_selected='0'/>", K::kApplicationOptions},
+      {"<o><a a_id='1' a_selected='0'/></o>", K::kApplicationOptions},
+      {"<trl_fingerprint/>", K::kFingerprint},
+      {"<fp><a><v/></a></fp>", K::kFingerprint},
+      {"<fp><a><f/></a></fp>", K::kFingerprint},
+      {"<fp><a><a/></a></fp>", K::kFingerprint},
+      {"<trl_applicationdata><c><m><d><f/></d></m></c></trl_applicationdata>", K::kLocalFiles},
+      {"<trl_applicationdata><c><m><d><a/></d></m></c></trl_applicationdata>", K::kResults},
+      {"<trl_applicationdata><a_missing/></trl_applicationdata>", K::kResults},
+      {"<trl_applicationdata><c/></trl_applicationdata>", K::kEmptyResults},
+      {"<events/>", K::kOther},
+      {"<e/>", K::kOther},
+      {"<o><a a_id='1'/></o>", K::kUnknown},
+  };
+  for (const auto& [text, kind] : cases) EXPECT_EQ(KindOf(*testing::Parse(text)), kind) << text;
+}
+
+class DocumentFilesTest : public ::testing::Test {
+ protected:
+  std::string Read(const std::string& name) const {
+    std::ifstream in(tree_.Native(name), std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), {}};
+  }
+  // The message of the CommandError (exit 2) that loading `name` for `role` ends in, or "".
+  std::string Refusal(const std::string& name, const DocumentRole& role) const {
+    try {
+      LoadDocumentFile(tree_.Native(name), role);
+    } catch (const CommandError& error) {
+      EXPECT_EQ(error.ExitCode(), kExitBadInput);
+      return error.what();
+    }
+    return "";
+  }
+  testing::TempTree tree_;
+};
+
+// A document is refused, naming the file and what it holds, for an option that takes another
+// kind, and nothing is written: neither the fingerprint a locate would save over nor the search
+// options a fingerprint would be added to.
+TEST_F(DocumentFilesTest, AFileOfAnotherKindIsRefusedBeforeAnythingIsWritten) {
+  const std::string search = "<o><c c_text='localhost'/></o>";
+  const std::string fingerprint = "<fp><a a_id='1'><v v_id='1'/></a></fp>";
+  tree_.AddFile("search.xml", search);
+  tree_.AddFile("fp.xml", fingerprint);
+  tree_.AddFile("empty.xml");
+  tree_.AddFile("user.xml", "<trl_applicationdata/>");
+  EXPECT_EQ(Refusal("fp.xml", kUserDataRole),
+            "'" + tree_.Native("fp.xml") +
+                "' was given as the user data, but it holds a "
+                "fingerprint database (applications with versions); nothing was written");
+  EXPECT_NE(Refusal("search.xml", kFingerprintRole).find("holds search options"),
+            std::string::npos);
+  EXPECT_EQ(Refusal("empty.xml", kSearchOptionsRole),
+            "the search options '" + tree_.Native("empty.xml") + "' is empty");
+  EXPECT_EQ(Refusal("user.xml", kUserDataRole), "");
+  EXPECT_EQ(Refusal("user.xml", kLocalFilesRole), "");
+  for (const char* line :
+       {"locate --search-options @search.xml --fingerprint @fp.xml --user-data @fp.xml --save",
+        "fingerprint add --folder @ --app-id 1 --app-name A --version-id 2 --version-name 2 "
+        "--seq 2 --database @search.xml"}) {
+    std::vector<std::string> args = testing::Words(line);
+    for (auto& arg : args) {
+      if (arg.starts_with("@")) arg = tree_.Native(arg.substr(1));
+    }
+    CLI::App app;
+    auto run = args[0] == "locate" ? AddLocateCommand(app) : AddFingerprintCommand(app);
+    std::reverse(args.begin(), args.end());
+    app.parse(args);
+    std::string message;
+    try {
+      run();
+    } catch (const CommandError& error) {
+      message = error.what();
+    }
+    EXPECT_NE(message.find("was given as the"), std::string::npos) << line << ": " << message;
+  }
+  EXPECT_EQ(Read("fp.xml"), fingerprint);
+  EXPECT_EQ(Read("search.xml"), search);
+}
+
+}  // namespace
+}  // namespace trl::cli
