@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "atomic_file.h"
 #include "command_error.h"
@@ -14,6 +15,7 @@
 #include "frame/vocabulary.h"
 #include "interrupt.h"
 #include "live_progress.h"
+#include "path_search_options.h"
 #include "platform/event_loop.h"
 #include "stage_command.h"
 #include "trl/locate.h"
@@ -24,6 +26,7 @@ namespace {
 constexpr const char* kExamplesDir = TRL_EXAMPLES_DIR;
 
 struct LocateOptions {
+  std::vector<std::string> paths;
   std::string searchOptions, applicationOptions, fingerprint, userData, log;
   std::string filter = "all";
   std::string format = "xml";
@@ -44,9 +47,23 @@ struct Outcome {
   std::string results;
 };
 
+Documents LoadNamedDocuments(const LocateOptions& options, const std::string& userData);
+
 Documents LoadDocuments(const LocateOptions& options) {
+  if (!options.paths.empty() && !options.searchOptions.empty()) {
+    throw CommandError("give the folders to search or --search-options, not both");
+  }
+  // The first save makes the user data: a file that is not there yet starts an empty inventory.
+  std::string userData = options.userData;
+  if (options.save && !std::filesystem::exists(userData)) userData.clear();
+  Documents documents = LoadNamedDocuments(options, userData);
+  if (!options.paths.empty()) documents.searchOptions = SearchOptionsForPaths(options.paths);
+  return documents;
+}
+
+Documents LoadNamedDocuments(const LocateOptions& options, const std::string& userData) {
   if (options.searchOptions.empty() && options.applicationOptions.empty() &&
-      options.fingerprint.empty() && options.userData.empty()) {
+      options.fingerprint.empty() && userData.empty()) {
     auto example = [](const char* name) {
       std::string path = (std::filesystem::path(kExamplesDir) / name).string();
       if (!std::filesystem::exists(path)) {
@@ -64,7 +81,7 @@ Documents LoadDocuments(const LocateOptions& options) {
   return {LoadOptionalDocumentFile(options.searchOptions, kSearchOptionsRole),
           LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole),
           LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole),
-          LoadOptionalDocumentFile(options.userData, kUserDataRole)};
+          LoadOptionalDocumentFile(userData, kUserDataRole)};
 }
 
 int Attribute(const std::string& updateXml, std::string_view name) {
@@ -186,6 +203,7 @@ int RunLocate(const LocateOptions& options) {
   }
 
   if (options.save) ReplaceFileAtomically(options.userData, documents.userData->Xml(), true);
+  int status = printer.Failures() > 0 ? kExitFailuresReported : kExitOk;
   if (options.format == "table") {
     xml::Document none;
     xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
@@ -195,7 +213,7 @@ int RunLocate(const LocateOptions& options) {
   } else {
     WriteTextOutput(outcome.results, options.stage.output);
   }
-  return kExitOk;
+  return status;
 }
 
 }  // namespace
@@ -206,6 +224,9 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
       "locate",
       "Find the known applications in the searched folders, identify their versions and merge "
       "the findings into the user data");
+  command->add_option("folders", options->paths,
+                      "Folders to search (instead of --search-options), each with everything "
+                      "below it");
   command->add_option("--search-options", options->searchOptions,
                       "Search options document (computers, drives, folders to search)");
   command->add_option("--application-options", options->applicationOptions,
@@ -231,9 +252,10 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
   command->add_flag("--sync", options->sync,
                     "Run each stage straight through (no live progress; Ctrl-C ends the process)");
   command->footer(
-      "Without any document option, runs on the bundled example. Exit codes: 0 done; 1 the run "
-      "did not complete or its output could not be written; 2 a bad command line or input "
-      "document; 130 cancelled by Ctrl-C (a second Ctrl-C quits at once).");
+      "Without folders or document options, runs on the bundled example. Exit codes: 0 done; 1 "
+      "the run did not complete or its output could not be written; 2 a bad command line or "
+      "input document; 3 done, but failures were reported; 130 cancelled by Ctrl-C (a second "
+      "Ctrl-C quits at once).");
   return [command, options] { return command->parsed() ? RunLocate(*options) : -1; };
 }
 

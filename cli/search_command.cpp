@@ -2,8 +2,11 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
+#include "command_error.h"
 #include "document_files.h"
+#include "path_search_options.h"
 #include "stage_command.h"
 #include "trl/search.h"
 
@@ -11,6 +14,7 @@ namespace trl::cli {
 namespace {
 
 struct SearchOptions {
+  std::vector<std::string> paths;
   std::string searchOptions;
   std::string applicationOptions;
   std::string fingerprint;
@@ -19,7 +23,12 @@ struct SearchOptions {
 };
 
 int RunSearch(const SearchOptions& options) {
-  auto searchOptions = LoadDocumentFile(options.searchOptions, kSearchOptionsRole);
+  if (options.paths.empty() == options.searchOptions.empty()) {
+    throw CommandError("give the folders to search or --search-options (one of them)");
+  }
+  auto searchOptions = options.paths.empty()
+                           ? LoadDocumentFile(options.searchOptions, kSearchOptionsRole)
+                           : SearchOptionsForPaths(options.paths);
   auto applicationOptions =
       LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
   auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
@@ -38,8 +47,10 @@ std::function<int()> AddSearchCommand(CLI::App& app) {
   auto options = std::make_shared<SearchOptions>();
   CLI::App* command =
       app.add_subcommand("search", "Walk the folders of the search options and record the files");
-  command->add_option("--search-options", options->searchOptions, "Search options document")
-      ->required();
+  command->add_option("folders", options->paths,
+                      "Folders to search (instead of --search-options), each with everything "
+                      "below it");
+  command->add_option("--search-options", options->searchOptions, "Search options document");
   command->add_option("--application-options", options->applicationOptions,
                       "Application options document (which applications take part)");
   command->add_option("--fingerprint", options->fingerprint,

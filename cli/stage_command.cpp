@@ -48,17 +48,19 @@ std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::stri
 }
 
 ReportPrinter::ReportPrinter(std::function<void()> beforePrint) {
-  ObserveReports([beforePrint = std::move(beforePrint)](const ReportedEventView& event) {
-    if (beforePrint && (event.kind == Reporter::kWarning || event.kind == Reporter::kFailure)) {
-      beforePrint();
-    }
-    if (event.kind == Reporter::kWarning) {
-      fmt::print(stderr, "trllocator: warning: {}\n", event.description);
-    } else if (event.kind == Reporter::kFailure) {
-      fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
-                 event.number, event.description);
-    }
-  });
+  ObserveReports(
+      [beforePrint = std::move(beforePrint), failures = failures_](const ReportedEventView& event) {
+        if (beforePrint && (event.kind == Reporter::kWarning || event.kind == Reporter::kFailure)) {
+          beforePrint();
+        }
+        if (event.kind == Reporter::kWarning) {
+          fmt::print(stderr, "trllocator: warning: {}\n", event.description);
+        } else if (event.kind == Reporter::kFailure) {
+          ++*failures;
+          fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className,
+                     event.procedure, event.number, event.description);
+        }
+      });
 }
 
 ReportPrinter::~ReportPrinter() { ObserveReports(nullptr); }

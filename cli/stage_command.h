@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <functional>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -36,6 +37,12 @@ class ReportPrinter {
   ~ReportPrinter();
   ReportPrinter(const ReportPrinter&) = delete;
   ReportPrinter& operator=(const ReportPrinter&) = delete;
+
+  // How many failures (not warnings) were reported while it lived.
+  int Failures() const { return *failures_; }
+
+ private:
+  std::shared_ptr<int> failures_ = std::make_shared<int>(0);
 };
 
 }  // namespace trl::cli

@@ -1,5 +1,3 @@
-#include "document_kind.h"
-
 #include <gtest/gtest.h>
 
 #include <CLI/CLI.hpp>
@@ -9,8 +7,10 @@
 
 #include "command_error.h"
 #include "document_files.h"
+#include "document_kind.h"
 #include "fingerprint_command.h"
 #include "locate_command.h"
+#include "path_search_options.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
 
@@ -55,6 +55,23 @@ class DocumentFilesTest : public ::testing::Test {
     }
     return "";
   }
+  // Runs a locate or fingerprint command line, "@name" naming a file of the tree; answers the exit
+  // code and the message of the error that ended it.
+  std::pair<int, std::string> Run(const std::string& line) const {
+    std::vector<std::string> args = testing::Words(line);
+    for (auto& arg : args) {
+      if (arg.starts_with("@")) arg = tree_.Native(arg.substr(1));
+    }
+    CLI::App app;
+    auto run = args[0] == "locate" ? AddLocateCommand(app) : AddFingerprintCommand(app);
+    std::reverse(args.begin(), args.end());
+    app.parse(args);
+    try {
+      return {run(), ""};
+    } catch (const CommandError& error) {
+      return {error.ExitCode(), error.what()};
+    }
+  }
   testing::TempTree tree_;
 };
 
@@ -82,24 +99,46 @@ TEST_F(DocumentFilesTest, AFileOfAnotherKindIsRefusedBeforeAnythingIsWritten) {
        {"locate --search-options @search.xml --fingerprint @fp.xml --user-data @fp.xml --save",
         "fingerprint add --folder @ --app-id 1 --app-name A --version-id 2 --version-name 2 "
         "--seq 2 --database @search.xml"}) {
-    std::vector<std::string> args = testing::Words(line);
-    for (auto& arg : args) {
-      if (arg.starts_with("@")) arg = tree_.Native(arg.substr(1));
-    }
-    CLI::App app;
-    auto run = args[0] == "locate" ? AddLocateCommand(app) : AddFingerprintCommand(app);
-    std::reverse(args.begin(), args.end());
-    app.parse(args);
-    std::string message;
-    try {
-      run();
-    } catch (const CommandError& error) {
-      message = error.what();
-    }
+    auto [status, message] = Run(line);
     EXPECT_NE(message.find("was given as the"), std::string::npos) << line << ": " << message;
   }
   EXPECT_EQ(Read("fp.xml"), fingerprint);
   EXPECT_EQ(Read("search.xml"), search);
+}
+
+// Folders named as a shell passes them (relative, with blanks, mixed case, a byte that is not
+// UTF-8) become one folder entry each, in the component's form; a path that is no folder is
+// refused.
+TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
+  tree_.AddFolder("My Dir/CLI\xff");
+  tree_.AddFile("file");
+  auto cwd = std::filesystem::current_path();
+  std::filesystem::current_path(tree_.Root());
+  auto options = SearchOptionsForPaths({"My Dir/./CLI\xff", tree_.Root()});
+  EXPECT_EQ(testing::ValuesOf(*options, "//c/m/d", "d_text"),
+            (std::vector<std::string>{tree_.Path("My Dir/CLI\xff") + "\\", tree_.Path() + "\\"}));
+  EXPECT_EQ(KindOf(*options), DocumentKind::kSearchOptions);
+  EXPECT_THROW(SearchOptionsForPaths({"file"}), CommandError);
+  EXPECT_THROW(SearchOptionsForPaths({"none"}), CommandError);
+  std::filesystem::current_path(cwd);
+}
+
+// The first save makes the user data; a run that completes with a failure reported (a property
+// of an unknown type) exits 3.
+TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree) {
+  tree_.AddFolder("app");
+  tree_.AddFile("app/tool.exe", "x");
+  tree_.AddFile("fp.xml",
+                "<fp><a a_id='1' a_name='Tool'><v v_id='1' v_name='1' v_seq='1'><f f_id='1' "
+                "f_name='tool.exe' f_relpath='' f_weight='1'><p p_type='9' p_weight='1' "
+                "p_value='x'/></f></v></a></fp>");
+  EXPECT_EQ(Run("locate @app --fingerprint @fp.xml --user-data @user.xml --save --sync "
+                "--output @out.xml")
+                .first,
+            kExitFailuresReported);
+  EXPECT_TRUE(Read("user.xml").starts_with("<trl_applicationdata"));
+  tree_.AddFile("fp.xml", "<fp><a a_id='1' a_name='Tool'/></fp>");
+  EXPECT_EQ(Run("locate @app --fingerprint @fp.xml --sync --output @out.xml").first, kExitOk);
 }
 
 }  // namespace

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "trl/xml.h"
+
+namespace trl::cli {
+
+// Search options for folders named on the command line, as any Linux tool takes them (relative
+// or absolute; a link is searched as given): the local computer, one folder entry per path, walked
+// with recursion, every attribute admitted, links to folders noted. A path that is not a folder
+// is a CommandError naming it.
+xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths);
+
+}  // namespace trl::cli
