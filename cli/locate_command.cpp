@@ -2,7 +2,10 @@
 
 #include <fmt/format.h>
 
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
@@ -164,6 +167,11 @@ int RunLocate(const LocateOptions& options) {
   }
   int16_t filter = ParseFilterOptions(options.filter);
   Documents documents = LoadDocuments(options);
+  if (!options.log.empty() && !std::ofstream(options.log, std::ios::app)) {
+    // Found out now, rather than reported at every entry of the run.
+    throw CommandError(
+        fmt::format("cannot write the log '{}': {}", options.log, std::strerror(errno)));
+  }
   std::unique_ptr<Inventory> before;
   if (options.format == "table") {
     xml::Document empty;
@@ -204,14 +212,21 @@ int RunLocate(const LocateOptions& options) {
 
   if (options.save) ReplaceFileAtomically(options.userData, documents.userData->Xml(), true);
   int status = printer.Failures() > 0 ? kExitFailuresReported : kExitOk;
-  if (options.format == "table") {
-    xml::Document none;
-    xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
-    WriteTextOutput(
-        WithoutLastLineEnd(FindingsTable(before->Changes(*documents.userData, fingerprint))),
-        options.stage.output);
-  } else {
-    WriteTextOutput(outcome.results, options.stage.output);
+  try {
+    if (options.format == "table") {
+      xml::Document none;
+      xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
+      WriteTextOutput(
+          WithoutLastLineEnd(FindingsTable(before->Changes(*documents.userData, fingerprint))),
+          options.stage.output);
+    } else {
+      WriteTextOutput(outcome.results, options.stage.output);
+    }
+  } catch (const CommandError& error) {
+    if (!options.save) throw;
+    throw CommandError(
+        fmt::format("{}; the user data was saved to '{}'", error.what(), options.userData),
+        error.ExitCode());
   }
   return status;
 }

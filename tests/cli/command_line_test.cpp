@@ -124,7 +124,7 @@ TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
 }
 
 // The first save makes the user data; a run that completes with a failure reported (a property
-// of an unknown type) exits 3.
+// of an unknown type) exits 3; a log that cannot be written stops the command before it runs.
 TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree) {
   tree_.AddFolder("app");
   tree_.AddFile("app/tool.exe", "x");
@@ -137,8 +137,17 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
                 .first,
             kExitFailuresReported);
   EXPECT_TRUE(Read("user.xml").starts_with("<trl_applicationdata"));
+  auto [failed, said] =
+      Run("locate @app --fingerprint @fp.xml --user-data @user.xml --save "
+          "--output @none/out.xml");
+  EXPECT_EQ(failed, kExitFailed);
+  EXPECT_TRUE(said.ends_with("; the user data was saved to '" + tree_.Native("user.xml") + "'"));
   tree_.AddFile("fp.xml", "<fp><a a_id='1' a_name='Tool'/></fp>");
   EXPECT_EQ(Run("locate @app --fingerprint @fp.xml --sync --output @out.xml").first, kExitOk);
+  auto [status, message] = Run("locate @app --fingerprint @fp.xml --log @none/x.log");
+  EXPECT_EQ(status, kExitBadInput);
+  EXPECT_EQ(message,
+            "cannot write the log '" + tree_.Native("none/x.log") + "': No such file or directory");
 }
 
 }  // namespace
