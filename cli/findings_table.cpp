@@ -10,6 +10,7 @@
 #include <unordered_map>
 
 #include "frame/vocabulary.h"
+#include "native_path.h"
 
 namespace trl::cli {
 namespace {
@@ -20,8 +21,10 @@ std::string Attribute(const xml::Node& node, std::string_view name) {
   return node.GetAttribute(name).value_or("");
 }
 
-// Folders are kept with "\" separators; a person on this system reads "/".
-std::string Readable(std::string path) {
+// Folders are kept with "\" separators; a person on this system reads "/", and on this computer
+// the folder's names as the disk spells them.
+std::string Readable(std::string path, bool local) {
+  if (local) return NativePath(path);
   std::replace(path.begin(), path.end(), '\\', '/');
   return path;
 }
@@ -96,7 +99,8 @@ Inventory::Inventory(xml::Document& userData) : missing_(MissingCount(userData))
   ForEachApplication(userData, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
     entries_.emplace(Key(c, m, d, a),
                      Entry{Attribute(c, vocab::c_text),
-                           Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
+                           Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
+                                    Attribute(c, vocab::c_local) == "1"),
                            Attribute(a, vocab::a_name), Attribute(a, vocab::v_id),
                            Attribute(a, vocab::v_name), Attribute(a, vocab::a_id)});
   });
@@ -110,7 +114,8 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     std::string key = Key(c, m, d, a);
     present.insert(key);
     Finding finding{Attribute(c, vocab::c_text),
-                    Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text)),
+                    Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
+                             Attribute(c, vocab::c_local) == "1"),
                     Attribute(a, vocab::a_name), VersionText(a, names), ""};
     auto before = entries_.find(key);
     std::string id = Attribute(a, vocab::v_id);
@@ -139,8 +144,8 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     auto match = gone.find(entry.applicationId);
     if (match == gone.end()) continue;
     gone.erase(match);
-    findings.push_back(Finding{entry.computer, Readable(entry.folder), entry.application,
-                               entry.versionName, "missing"});
+    findings.push_back(
+        Finding{entry.computer, entry.folder, entry.application, entry.versionName, "missing"});
   }
 
   std::sort(findings.begin(), findings.end(), [](const Finding& x, const Finding& y) {

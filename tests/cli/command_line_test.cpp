@@ -10,6 +10,7 @@
 #include "document_kind.h"
 #include "fingerprint_command.h"
 #include "locate_command.h"
+#include "native_path.h"
 #include "path_search_options.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
@@ -118,6 +119,9 @@ TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
   EXPECT_EQ(testing::ValuesOf(*options, "//c/m/d", "d_text"),
             (std::vector<std::string>{tree_.Path("My Dir/CLI\xff") + "\\", tree_.Path() + "\\"}));
   EXPECT_EQ(KindOf(*options), DocumentKind::kSearchOptions);
+  // A folder the documents hold lower-cased is shown as the disk spells it, in its own bytes.
+  EXPECT_EQ(NativePath(testing::Lower(tree_.Path("My Dir/CLI\xff")) + "\\"),
+            tree_.Native("My Dir/CLI\xff") + "/");
   EXPECT_THROW(SearchOptionsForPaths({"file"}), CommandError);
   EXPECT_THROW(SearchOptionsForPaths({"none"}), CommandError);
   std::filesystem::current_path(cwd);
