@@ -7,6 +7,7 @@
 #include "compare_command.h"
 #include "filter_command.h"
 #include "fingerprint_command.h"
+#include "inventory_command.h"
 #include "locate_command.h"
 #include "merge_command.h"
 #include "search_command.h"
@@ -18,10 +19,12 @@ int main(int argc, char** argv) {
   app.set_version_flag("--version", std::string("trllocator ") + TRL_VERSION);
   app.footer(
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
-      "2 a bad command line or input document; 130 cancelled by Ctrl-C.");
-  std::vector<std::function<int()>> commands{AddSearchCommand(app), AddCompareCommand(app),
-                                             AddFilterCommand(app), AddMergeCommand(app),
-                                             AddLocateCommand(app), AddFingerprintCommand(app)};
+      "2 a bad command line or input document; 3 done, but failures were reported (locate); "
+      "130 cancelled by Ctrl-C.");
+  std::vector<std::function<int()>> commands{AddSearchCommand(app),   AddCompareCommand(app),
+                                             AddFilterCommand(app),   AddMergeCommand(app),
+                                             AddLocateCommand(app),   AddFingerprintCommand(app),
+                                             AddInventoryCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {

@@ -9,6 +9,7 @@
 #include "document_files.h"
 #include "document_kind.h"
 #include "fingerprint_command.h"
+#include "inventory_command.h"
 #include "locate_command.h"
 #include "native_path.h"
 #include "path_search_options.h"
@@ -64,7 +65,9 @@ class DocumentFilesTest : public ::testing::Test {
       if (arg.starts_with("@")) arg = tree_.Native(arg.substr(1));
     }
     CLI::App app;
-    auto run = args[0] == "locate" ? AddLocateCommand(app) : AddFingerprintCommand(app);
+    auto run = args[0] == "locate"      ? AddLocateCommand(app)
+               : args[0] == "inventory" ? AddInventoryCommand(app)
+                                        : AddFingerprintCommand(app);
     std::reverse(args.begin(), args.end());
     app.parse(args);
     try {
@@ -140,7 +143,10 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
                 "--output @out.xml")
                 .first,
             kExitFailuresReported);
-  EXPECT_TRUE(Read("user.xml").starts_with("<trl_applicationdata"));
+  ::testing::internal::CaptureStdout();
+  EXPECT_EQ(Run("inventory --user-data @user.xml").first, kExitOk);
+  EXPECT_NE(::testing::internal::GetCapturedStdout().find("localhost  " + tree_.Native("app/")),
+            std::string::npos);
   auto [failed, said] =
       Run("locate @app --fingerprint @fp.xml --user-data @user.xml --save "
           "--output @none/out.xml");
