@@ -60,7 +60,10 @@ Documents LoadDocuments(const LocateOptions& options) {
   std::string userData = options.userData;
   if (options.save && !std::filesystem::exists(userData)) userData.clear();
   Documents documents = LoadNamedDocuments(options, userData);
-  if (!options.paths.empty()) documents.searchOptions = SearchOptionsForPaths(options.paths);
+  if (!options.paths.empty()) {
+    documents.searchOptions = SearchOptionsForPaths(options.paths);
+    if (documents.userData) ListManagedApplications(*documents.searchOptions, *documents.userData);
+  }
   return documents;
 }
 

@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
@@ -25,7 +26,37 @@ std::string ComponentFolder(const std::filesystem::path& absolute) {
   return folder;
 }
 
+// Whether `folder` lies in `root` (both in "\" form, ending with "\"), letter case aside.
+bool Below(const std::string& folder, const std::string& root) {
+  return LowerCase(folder).starts_with(LowerCase(root));
+}
+
 }  // namespace
+
+void ListManagedApplications(xml::Document& searchOptions, xml::Document& userData) {
+  xml::Node m = searchOptions.DocumentElement().SelectSingleNode("c/m");
+  std::vector<std::string> roots;
+  for (const xml::Node& d : m.ChildElements(vocab::d))
+    roots.push_back(*d.GetAttribute(vocab::d_text));
+  xml::Node root = userData.DocumentElement();
+  if (!root) return;
+  for (const xml::Node& a : root.SelectNodes("c[@c_local='1']/m[@m_name='']/d/a[@a_manage='1']")) {
+    xml::Node d = a.ParentNode();
+    std::string folder = d.GetAttribute(vocab::d_text).value_or("");
+    if (std::none_of(roots.begin(), roots.end(),
+                     [&](const std::string& root) { return Below(folder, root); })) {
+      continue;
+    }
+    xml::Node place = m.AppendChild(searchOptions.CreateElement(vocab::d));
+    place.SetAttribute(vocab::d_id, std::to_string(m.ChildElements(vocab::d).size()));
+    place.SetAttribute(vocab::d_text, folder);
+    place.SetAttribute(vocab::d_name, d.GetAttribute(vocab::d_name).value_or(""));
+    xml::Node managed = place.AppendChild(searchOptions.CreateElement(vocab::a));
+    managed.SetAttribute(vocab::a_id, a.GetAttribute(vocab::a_id).value_or(""));
+    managed.SetAttribute(vocab::a_name, a.GetAttribute(vocab::a_name).value_or(""));
+    managed.SetAttribute(vocab::a_manage, "1");
+  }
+}
 
 xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths) {
   auto document = std::make_shared<xml::Document>();

@@ -13,4 +13,9 @@ namespace trl::cli {
 // is a CommandError naming it.
 xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths);
 
+// Lists in `searchOptions` (made by SearchOptionsForPaths) the managed applications of this
+// computer that `userData` holds below the searched folders, each at its own place, so that one
+// no longer found there is reported missing.
+void ListManagedApplications(xml::Document& searchOptions, xml::Document& userData);
+
 }  // namespace trl::cli

@@ -160,5 +160,24 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
             "cannot write the log '" + tree_.Native("none/x.log") + "': No such file or directory");
 }
 
+// An application found and saved on a run over folders is watched from then on: once its folder is
+// gone, the next run over the same folders reports it missing.
+TEST_F(DocumentFilesTest, AnApplicationSavedFromFoldersIsReportedMissingOnceGone) {
+  tree_.AddFolder("tree/app");
+  tree_.AddFile("tree/app/tool.exe", "x");
+  tree_.AddFile("fp.xml",
+                "<fp><a a_id='1' a_name='Tool'><v v_id='1' v_name='1' v_seq='1'><f f_id='1' "
+                "f_name='tool.exe' f_relpath='' f_weight='1'/></v></a></fp>");
+  const std::string run =
+      "locate @tree --fingerprint @fp.xml --user-data @user.xml --save --sync "
+      "--format table --output @table.txt";
+  ASSERT_EQ(Run(run).first, kExitOk);
+  EXPECT_NE(Read("table.txt").find("Tool         1        new"), std::string::npos);
+  std::filesystem::remove_all(tree_.Native("tree/app"));
+  ASSERT_EQ(Run(run).first, kExitOk);
+  EXPECT_NE(Read("table.txt").find("Tool         1        missing"), std::string::npos)
+      << Read("table.txt");
+}
+
 }  // namespace
 }  // namespace trl::cli
