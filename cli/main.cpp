@@ -9,6 +9,7 @@
 #include "fingerprint_command.h"
 #include "inventory_command.h"
 #include "locate_command.h"
+#include "manage_command.h"
 #include "merge_command.h"
 #include "search_command.h"
 #include "version.h"
@@ -21,10 +22,10 @@ int main(int argc, char** argv) {
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
       "2 a bad command line or input document; 3 done, but failures were reported (locate); "
       "130 cancelled by Ctrl-C.");
-  std::vector<std::function<int()>> commands{AddSearchCommand(app),   AddCompareCommand(app),
-                                             AddFilterCommand(app),   AddMergeCommand(app),
-                                             AddLocateCommand(app),   AddFingerprintCommand(app),
-                                             AddInventoryCommand(app)};
+  std::vector<std::function<int()>> commands{AddSearchCommand(app),    AddCompareCommand(app),
+                                             AddFilterCommand(app),    AddMergeCommand(app),
+                                             AddLocateCommand(app),    AddFingerprintCommand(app),
+                                             AddInventoryCommand(app), AddManageCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {

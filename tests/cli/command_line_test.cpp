@@ -11,6 +11,7 @@
 #include "fingerprint_command.h"
 #include "inventory_command.h"
 #include "locate_command.h"
+#include "manage_command.h"
 #include "native_path.h"
 #include "path_search_options.h"
 #include "support/documents.h"
@@ -67,6 +68,7 @@ class DocumentFilesTest : public ::testing::Test {
     CLI::App app;
     auto run = args[0] == "locate"      ? AddLocateCommand(app)
                : args[0] == "inventory" ? AddInventoryCommand(app)
+               : args[0] == "manage"    ? AddManageCommand(app)
                                         : AddFingerprintCommand(app);
     std::reverse(args.begin(), args.end());
     app.parse(args);
@@ -161,7 +163,7 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
 }
 
 // An application found and saved on a run over folders is watched from then on: once its folder is
-// gone, the next run over the same folders reports it missing.
+// gone, the next run over the same folders reports it missing; unless the user stopped watching it.
 TEST_F(DocumentFilesTest, AnApplicationSavedFromFoldersIsReportedMissingOnceGone) {
   tree_.AddFolder("tree/app");
   tree_.AddFile("tree/app/tool.exe", "x");
@@ -173,10 +175,17 @@ TEST_F(DocumentFilesTest, AnApplicationSavedFromFoldersIsReportedMissingOnceGone
       "--format table --output @table.txt";
   ASSERT_EQ(Run(run).first, kExitOk);
   EXPECT_NE(Read("table.txt").find("Tool         1        new"), std::string::npos);
+  std::string saved = Read("user.xml");
+  EXPECT_EQ(Run("manage --user-data @user.xml @nowhere").first, kExitBadInput);
+  EXPECT_EQ(Read("user.xml"), saved);
   std::filesystem::remove_all(tree_.Native("tree/app"));
   ASSERT_EQ(Run(run).first, kExitOk);
   EXPECT_NE(Read("table.txt").find("Tool         1        missing"), std::string::npos)
       << Read("table.txt");
+  tree_.AddFile("user.xml", saved);
+  ASSERT_EQ(Run("manage --user-data @user.xml --off tool").first, kExitOk);
+  ASSERT_EQ(Run(run).first, kExitOk);
+  EXPECT_EQ(Read("table.txt").find("missing"), std::string::npos) << Read("table.txt");
 }
 
 }  // namespace
