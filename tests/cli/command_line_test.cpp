@@ -6,6 +6,7 @@
 #include <iterator>
 
 #include "command_error.h"
+#include "document_check.h"
 #include "document_files.h"
 #include "document_kind.h"
 #include "fingerprint_command.h"
@@ -40,6 +41,30 @@ TEST(DocumentKindTest, EachKindIsToldByItsRootAndWhatLiesBelowIt) {
       {"<o><a a_id='1'/></o>", K::kUnknown},
   };
   for (const auto& [text, kind] : cases) EXPECT_EQ(KindOf(*testing::Parse(text)), kind) << text;
+}
+
+// Each flaw found, with the element's place: a missing attribute, an id that is no number or is
+// used twice, a weight out of range, an apostrophe in a name, versions no file tells apart.
+TEST(DocumentCheckTest, EachFlawIsFoundWithItsPlace) {
+  const std::string version =
+      "v_name='1' v_seq='1'><f f_id='1' f_name='x' f_weight='16'><p "
+      "p_type='2' p_weight='1' p_value='3'/></f></v>";
+  const std::pair<std::string, std::vector<std::string>> cases[] = {
+      {"<fp><a a_id='1' a_name='A'><v v_id='1' " + version + "<v v_id='x' " + version +
+           "</a><a a_id='1'/></fp>",
+       {"a[a_id=1]: has no a_name", "a[a_id=1]: a_id 1 is used twice in the document",
+        "a[a_id=1]/v[v_id=x]: v_id 'x' is not a number",
+        "a[a_id=1]/v[v_id=1]/f[f_id=1]: f_weight '16' is not a whole number from 0 to 15",
+        "a[a_id=1]/v[v_id=x]/f[f_id=1]: f_weight '16' is not a whole number from 0 to 15",
+        "a[a_id=1]/v[v_id=x]: cannot be told apart from a[a_id=1]/v[v_id=1] by any file"}},
+      {"<o><c c_text='h' c_name=\"h'x\"><m m_text='' m_name=''><d/></m></c></o>",
+       {"c: c_name holds an apostrophe, which breaks the selections it is used in",
+        "c/m/d: has no d_text"}},
+  };
+  for (const auto& [text, findings] : cases) {
+    auto document = testing::Parse(text);
+    EXPECT_EQ(CheckDocument(*document, KindOf(*document)), findings) << text;
+  }
 }
 
 class DocumentFilesTest : public ::testing::Test {
