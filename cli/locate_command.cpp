@@ -29,7 +29,7 @@ namespace {
 constexpr const char* kExamplesDir = TRL_EXAMPLES_DIR;
 
 struct LocateOptions {
-  std::vector<std::string> paths;
+  std::vector<std::string> paths, excluded;
   std::string searchOptions, applicationOptions, fingerprint, userData, log;
   std::string filter = "all";
   std::string format = "xml";
@@ -64,6 +64,7 @@ Documents LoadDocuments(const LocateOptions& options) {
     documents.searchOptions = SearchOptionsForPaths(options.paths);
     if (documents.userData) ListManagedApplications(*documents.searchOptions, *documents.userData);
   }
+  if (!options.excluded.empty()) ExcludeFolders(*documents.searchOptions, options.excluded);
   return documents;
 }
 
@@ -245,6 +246,8 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
   command->add_option("folders", options->paths,
                       "Folders to search (instead of --search-options), each with everything "
                       "below it");
+  command->add_option("--exclude", options->excluded,
+                      "Leave out the folders this glob matches, by name or by path (repeatable)");
   command->add_option("--search-options", options->searchOptions,
                       "Search options document (computers, drives, folders to search)");
   command->add_option("--application-options", options->applicationOptions,

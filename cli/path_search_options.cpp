@@ -58,6 +58,14 @@ void ListManagedApplications(xml::Document& searchOptions, xml::Document& userDa
   }
 }
 
+void ExcludeFolders(xml::Document& searchOptions, const std::vector<std::string>& globs) {
+  for (xml::Node d : searchOptions.AsNode().SelectNodes("/*/c/m/d[@d_search='1']")) {
+    for (const std::string& glob : globs) {
+      d.AppendChild(searchOptions.CreateElement(vocab::d_search_exclude)).SetText(glob);
+    }
+  }
+}
+
 xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths) {
   auto document = std::make_shared<xml::Document>();
   xml::Node root = document->SetDocumentElement(document->CreateElement("trl_searchoptions"));

@@ -13,6 +13,10 @@ namespace trl::cli {
 // is a CommandError naming it.
 xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths);
 
+// Leaves the folders that `globs` match (by name, or by native path) out of the walk of every
+// folder entry of `searchOptions`.
+void ExcludeFolders(xml::Document& searchOptions, const std::vector<std::string>& globs);
+
 // Lists in `searchOptions` (made by SearchOptionsForPaths) the managed applications of this
 // computer that `userData` holds below the searched folders, each at its own place, so that one
 // no longer found there is reported missing.

@@ -14,7 +14,7 @@ namespace trl::cli {
 namespace {
 
 struct SearchOptions {
-  std::vector<std::string> paths;
+  std::vector<std::string> paths, excluded;
   std::string searchOptions;
   std::string applicationOptions;
   std::string fingerprint;
@@ -29,6 +29,7 @@ int RunSearch(const SearchOptions& options) {
   auto searchOptions = options.paths.empty()
                            ? LoadDocumentFile(options.searchOptions, kSearchOptionsRole)
                            : SearchOptionsForPaths(options.paths);
+  if (!options.excluded.empty()) ExcludeFolders(*searchOptions, options.excluded);
   auto applicationOptions =
       LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
   auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
@@ -51,6 +52,8 @@ std::function<int()> AddSearchCommand(CLI::App& app) {
                       "Folders to search (instead of --search-options), each with everything "
                       "below it");
   command->add_option("--search-options", options->searchOptions, "Search options document");
+  command->add_option("--exclude", options->excluded,
+                      "Leave out the folders this glob matches, by name or by path (repeatable)");
   command->add_option("--application-options", options->applicationOptions,
                       "Application options document (which applications take part)");
   command->add_option("--fingerprint", options->fingerprint,

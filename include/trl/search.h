@@ -58,8 +58,9 @@ class Search : public Worker {
     int16_t folderMask = 0;
     int16_t fileMask = 0;
     int16_t properties = 0;
-    bool links = false;  // links to folders are noted
-    xml::Node computer;  // the c and m elements of the results being added to
+    bool links = false;                 // links to folders are noted
+    std::vector<std::string> excluded;  // globs of folders left out
+    xml::Node computer;                 // the c and m elements of the results being added to
     xml::Node drive;
   };
 
@@ -77,6 +78,8 @@ class Search : public Worker {
   void FindFiles(const std::string& path, xml::Node parent, const std::string& relativePath,
                  bool recurse, int16_t folderMask, int16_t fileMask, int16_t properties);
   bool AddFile(xml::Node folder, const fs::File& file, int16_t properties);
+  // Whether the folder at `path` (the component's form) is left out of the walk.
+  bool Excluded(const std::string& name, const std::string& path) const;
   // The encoded name of a folder: with its case kept below a folder that has a case sibling.
   std::string EncodedFolder(const std::string& relativePath) const;
 

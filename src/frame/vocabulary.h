@@ -18,6 +18,8 @@ inline constexpr std::string_view n = "n";
 inline constexpr std::string_view o = "o";
 inline constexpr std::string_view l = "l";  // a link to a folder, under its drive
 inline constexpr std::string_view d_search_mask = "d_search_mask";
+// A folder the walk leaves out: a glob on its name or its path, one element each.
+inline constexpr std::string_view d_search_exclude = "d_search_exclude";
 inline constexpr std::string_view v_history = "v_history";
 inline constexpr std::string_view a_missing_list =
     "a_missing";  // the list under the user-data root

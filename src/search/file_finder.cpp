@@ -1,3 +1,6 @@
+#include <fnmatch.h>
+
+#include <algorithm>
 #include <array>
 #include <utility>
 
@@ -8,6 +11,7 @@
 #include "platform/convert.h"
 #include "platform/fs/file_system.h"
 #include "platform/regexp.h"
+#include "platform/text.h"
 #include "schema/schema.h"
 #include "search/search_names.h"
 #include "trl/search.h"
@@ -137,7 +141,7 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
                 subPath = subFolder->Path() + "\\";
                 sibling = subFolder->HasCaseSibling();
               }) &&
-              !name.empty()) {
+              !name.empty() && !Excluded(name, subPath)) {
             // Below the first folder with a case sibling, folders are told apart from there on.
             size_t outer = caseExactFrom_;
             if (sibling && outer == std::string::npos) caseExactFrom_ = relativePath.size();
@@ -151,6 +155,20 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
     }
   }
   YieldIfAsynchronous(on);
+}
+
+bool Search::Excluded(const std::string& name, const std::string& path) const {
+  if (read_.excluded.empty()) return false;
+  // Matched as a person wrote them: on native names, "/" between them.
+  std::string native = NameToNative(name);
+  std::string slashed = path;
+  std::replace(slashed.begin(), slashed.end(), '\\', '/');
+  std::string nativePath = NameToNative(slashed);
+  if (nativePath.size() > 1 && nativePath.ends_with('/')) nativePath.pop_back();
+  return std::any_of(read_.excluded.begin(), read_.excluded.end(), [&](const std::string& glob) {
+    return fnmatch(glob.c_str(), native.c_str(), 0) == 0 ||
+           fnmatch(glob.c_str(), nativePath.c_str(), FNM_PATHNAME) == 0;
+  });
 }
 
 std::string Search::EncodedFolder(const std::string& relativePath) const {

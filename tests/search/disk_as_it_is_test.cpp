@@ -110,5 +110,18 @@ TEST_F(DiskTest, LinksToFoldersPlaceFilesWhereTheLinksPutThem) {
   EXPECT_EQ(Found(), "\\usr\\ binonly 1:1/1|\\opt\\app\\1.2\\ js 1:1/1");
 }
 
+// A folder an exclusion matches, by its name or by its native path, is not walked.
+TEST_F(DiskTest, ExcludedFoldersAreNotWalked) {
+  for (const char* file : {"a/node_modules/x/f", "a/keep/f", "b/skip/f", "c/f"}) {
+    tree_.AddFolder(std::string(file).substr(0, std::string(file).rfind('/')));
+    tree_.AddFile(file);
+  }
+  auto local = Run(LocalOptions(tree_.Path(), "d_search='1'",
+                                "<d_search_mask/><d_search_exclude>node_*</d_search_exclude>"
+                                "<d_search_exclude>" +
+                                    tree_.Native("b") + "/*</d_search_exclude>"));
+  EXPECT_EQ(Summary(*local, tree_.Path()), "\\a\\keep\\ f|\\c\\ f");
+}
+
 }  // namespace
 }  // namespace trl::testing
