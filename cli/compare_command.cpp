@@ -23,7 +23,7 @@ int RunCompare(const CompareOptions& options) {
   auto localFiles = LoadDocumentFile(options.localFiles, kLocalFilesRole);
   auto fingerprint = LoadDocumentFile(options.fingerprint, kFingerprintRole);
 
-  ReportPrinter printer;
+  ReportPrinter printer(options.stage);
   Compare compare(FileSystemWithShares(options.stage.shares));
   compare.Asynchronous(false);
   std::string text = compare.Start(applicationOptions, localFiles, fingerprint);

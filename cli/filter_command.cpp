@@ -21,7 +21,7 @@ int RunFilter(const FilterOptions& options) {
   int16_t filterOptions = ParseFilterOptions(options.filter);
   auto matches = LoadDocumentFile(options.matches, kResultsRole);
 
-  ReportPrinter printer;
+  ReportPrinter printer(options.stage);
   Filter filter;
   filter.Asynchronous(false);
   std::string text = filter.Start(filterOptions, matches);

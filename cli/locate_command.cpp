@@ -181,6 +181,12 @@ int RunLocate(const LocateOptions& options) {
     xml::Document empty;
     before = std::make_unique<Inventory>(documents.userData ? *documents.userData : empty);
   }
+  if (!documents.applicationOptions) {
+    // Every application takes part, as without any; the run log can still show the options.
+    documents.applicationOptions = std::make_shared<xml::Document>();
+    documents.applicationOptions->SetDocumentElement(
+        documents.applicationOptions->CreateElement("trl_applicationoptions"));
+  }
   if (!documents.userData) {
     // Kept here rather than left to the run, so that the merged inventory can be read and saved.
     documents.userData = std::make_shared<xml::Document>();
@@ -188,7 +194,7 @@ int RunLocate(const LocateOptions& options) {
   }
 
   LiveProgress progress;
-  ReportPrinter printer([&progress] { progress.Clear(); });
+  ReportPrinter printer(options.stage, [&progress] { progress.Clear(); });
   Locate locate(FileSystemWithShares(options.stage.shares),
                 FileSystemWithShares(options.stage.shares));
   locate.Asynchronous(!options.sync);

@@ -25,7 +25,7 @@ int RunMerge(const MergeOptions& options) {
   auto userData = LoadDocumentFile(options.userData, kUserDataRole);
   auto newResults = LoadDocumentFile(options.newResults, kNewResultsRole);
 
-  ReportPrinter printer;
+  ReportPrinter printer(options.stage);
   Merge merge;
   merge.Asynchronous(false);
   std::string text = merge.Start(searchOptions, applicationOptions, userData, newResults);

@@ -35,7 +35,7 @@ int RunSearch(const SearchOptions& options) {
   auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
   auto results = LoadOptionalDocumentFile(options.results, kLocalFilesRole);
 
-  ReportPrinter printer;
+  ReportPrinter printer(options.stage);
   Search search(FileSystemWithShares(options.stage.shares));
   search.Asynchronous(false);
   std::string text = search.Start(searchOptions, applicationOptions, fingerprint, results);

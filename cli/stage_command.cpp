@@ -23,6 +23,9 @@ void AddShareOption(CLI::App& command, StageOptions& options) {
 void AddOutputOption(CLI::App& command, StageOptions& options) {
   command.add_option("--output,-o", options.output,
                      "Write the result document to FILE instead of standard output");
+  command.add_flag("-q,--quiet", options.quiet, "Print failures only, no warnings");
+  command.add_flag("-v,--verbose", options.verbose,
+                   "Print every report, the run log's entries included");
 }
 
 int WriteStageOutput(const std::string& text, std::string_view stage, const StageOptions& options) {
@@ -47,20 +50,24 @@ std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::stri
   return fs::CreatePosixFileSystem(std::move(table));
 }
 
-ReportPrinter::ReportPrinter(std::function<void()> beforePrint) {
-  ObserveReports(
-      [beforePrint = std::move(beforePrint), failures = failures_](const ReportedEventView& event) {
-        if (beforePrint && (event.kind == Reporter::kWarning || event.kind == Reporter::kFailure)) {
-          beforePrint();
-        }
-        if (event.kind == Reporter::kWarning) {
-          fmt::print(stderr, "trllocator: warning: {}\n", event.description);
-        } else if (event.kind == Reporter::kFailure) {
-          ++*failures;
-          fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className,
-                     event.procedure, event.number, event.description);
-        }
-      });
+ReportPrinter::ReportPrinter(const StageOptions& options, std::function<void()> beforePrint) {
+  ObserveReports([beforePrint = std::move(beforePrint), failures = failures_, quiet = options.quiet,
+                  verbose = options.verbose](const ReportedEventView& event) {
+    bool shown = event.kind == Reporter::kFailure || (event.kind == Reporter::kWarning && !quiet) ||
+                 (event.kind == Reporter::kLog && verbose);
+    if (event.kind == Reporter::kFailure) ++*failures;
+    if (!shown) return;
+    if (beforePrint) beforePrint();
+    if (event.kind == Reporter::kWarning) {
+      fmt::print(stderr, "trllocator: warning: {}\n", event.description);
+    } else if (event.kind == Reporter::kFailure) {
+      fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
+                 event.number, event.description);
+    } else {
+      fmt::print(stderr, "trllocator: {}.{}: {}\n", event.className, event.procedure,
+                 event.description);
+    }
+  });
 }
 
 ReportPrinter::~ReportPrinter() { ObserveReports(nullptr); }

@@ -16,6 +16,8 @@ namespace trl::cli {
 struct StageOptions {
   std::vector<std::string> shares;  // "\\HOST\SHARE=DIR"
   std::string output;
+  bool quiet = false;    // failures only
+  bool verbose = false;  // every report, run-log entries included
 };
 
 void AddShareOption(CLI::App& command, StageOptions& options);
@@ -29,11 +31,12 @@ int WriteStageOutput(const std::string& text, std::string_view stage, const Stag
 // A malformed mapping is a CommandError.
 std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::string>& shares);
 
-// Prints each warning and failure the stages report to standard error while it lives, each after
+// Prints each warning and failure the stages report to standard error while it lives (failures
+// only when `options` ask for quiet, run-log entries too when they ask for verbose), each after
 // calling `beforePrint` (which can clear a status line).
 class ReportPrinter {
  public:
-  explicit ReportPrinter(std::function<void()> beforePrint = {});
+  explicit ReportPrinter(const StageOptions& options, std::function<void()> beforePrint = {});
   ~ReportPrinter();
   ReportPrinter(const ReportPrinter&) = delete;
   ReportPrinter& operator=(const ReportPrinter&) = delete;

@@ -19,6 +19,10 @@ void ObserveReports(std::function<void(const ReportedEventView&)> observer) {
   reportObserver = std::move(observer);
 }
 
+void ShowObserver(const ReportedEventView& event) {
+  if (reportObserver) reportObserver(event);
+}
+
 int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
                     std::string_view component, std::string_view className,
                     std::string_view procedure, bool flag1, bool flag2, std::string_view source,
@@ -30,7 +34,7 @@ int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
   }
   int32_t action = sharedReporter->Report(number, description, kind, component, className,
                                           procedure, flag1, flag2, source, lastValue);
-  if (reportObserver) reportObserver({number, description, kind, className, procedure});
+  ShowObserver({number, description, kind, className, procedure});
   return forceIgnore ? kActionIgnore : action;
 }
 

@@ -47,6 +47,8 @@ struct ReportedEventView {
   std::string_view procedure;
 };
 void ObserveReports(std::function<void(const ReportedEventView&)> observer);
+// Shows the observer an event reported to a reporter of its own (Locate's run log).
+void ShowObserver(const ReportedEventView& event);
 
 // Reports a warning (kind 2) of `className`.`procedure` through HandleEvent and goes on.
 void ReportWarning(int32_t number, std::string_view description, std::string_view className,
