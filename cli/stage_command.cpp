@@ -7,6 +7,7 @@
 #include "command_error.h"
 #include "document_files.h"
 #include "frame/error_handler.h"
+#include "native_path.h"
 #include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "platform/fs/share_table.h"
@@ -50,6 +51,28 @@ std::unique_ptr<fs::FileSystem> FileSystemWithShares(const std::vector<std::stri
   return fs::CreatePosixFileSystem(std::move(table));
 }
 
+namespace {
+
+// A report's text as a person on this system reads it: each quoted path of this computer in the
+// component's "\\" form shown natively ("Path '\\tmp\\x\\' could not be found").
+std::string ForPeople(std::string_view description) {
+  std::string text;
+  for (size_t at = 0; at < description.size();) {
+    size_t open = description.find("'\\", at);
+    size_t close = open == std::string_view::npos ? open : description.find('\'', open + 1);
+    if (close == std::string_view::npos || description.substr(open, 3) == "'\\\\") {
+      text += description.substr(at);
+      break;
+    }
+    text += description.substr(at, open + 1 - at);
+    text += NativePath(description.substr(open + 1, close - open - 1));
+    at = close;
+  }
+  return text;
+}
+
+}  // namespace
+
 ReportPrinter::ReportPrinter(const StageOptions& options, std::function<void()> beforePrint) {
   ObserveReports([beforePrint = std::move(beforePrint), failures = failures_, quiet = options.quiet,
                   verbose = options.verbose](const ReportedEventView& event) {
@@ -59,10 +82,10 @@ ReportPrinter::ReportPrinter(const StageOptions& options, std::function<void()> 
     if (!shown) return;
     if (beforePrint) beforePrint();
     if (event.kind == Reporter::kWarning) {
-      fmt::print(stderr, "trllocator: warning: {}\n", event.description);
+      fmt::print(stderr, "trllocator: warning: {}\n", ForPeople(event.description));
     } else if (event.kind == Reporter::kFailure) {
       fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
-                 event.number, event.description);
+                 event.number, ForPeople(event.description));
     } else {
       fmt::print(stderr, "trllocator: {}.{}: {}\n", event.className, event.procedure,
                  event.description);

@@ -15,6 +15,7 @@
 #include "manage_command.h"
 #include "native_path.h"
 #include "path_search_options.h"
+#include "search_command.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
 
@@ -94,6 +95,7 @@ class DocumentFilesTest : public ::testing::Test {
     auto run = args[0] == "locate"      ? AddLocateCommand(app)
                : args[0] == "inventory" ? AddInventoryCommand(app)
                : args[0] == "manage"    ? AddManageCommand(app)
+               : args[0] == "search"    ? AddSearchCommand(app)
                                         : AddFingerprintCommand(app);
     std::reverse(args.begin(), args.end());
     app.parse(args);
@@ -154,6 +156,17 @@ TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
             tree_.Native("My Dir/CLI\xff") + "/");
   EXPECT_THROW(SearchOptionsForPaths({"file"}), CommandError);
   EXPECT_THROW(SearchOptionsForPaths({"none"}), CommandError);
+  // A warning names the folder natively, in the case the disk has where it exists.
+  tree_.AddFile("gone.xml",
+                "<o><c c_id='1' c_text='localhost' c_name='localhost' c_local='1'>"
+                "<m m_id='1' m_text='' m_name=''><d d_id='1' d_text='" +
+                    testing::Lower(tree_.Path("My Dir")) +
+                    "\\Gone\\' d_search='1'><d_search_mask/></d></m></c></o>");
+  ::testing::internal::CaptureStderr();
+  Run("search --search-options @gone.xml -o @out.xml");
+  EXPECT_EQ(
+      ::testing::internal::GetCapturedStderr(),
+      "trllocator: warning: Path '" + tree_.Native("My Dir/Gone/") + "' could not be found\n");
   std::filesystem::current_path(cwd);
 }
 

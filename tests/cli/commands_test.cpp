@@ -142,7 +142,7 @@ TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageRepor
   // A command line, what it prints, and a path to exactly one node of its output.
   const std::tuple<std::string, std::string, std::string> cases[] = {
       {"search --search-options @search.xml",
-       "trllocator: warning: Path '" + tree_.Path("Gone") + "\\' could not be found\n",
+       "trllocator: warning: Path '" + tree_.Native("Gone") + "/' could not be found\n",
        "/*/c/m/d/f[@f_text='Main.exe']"},
       {"compare --local-files @local.xml --fingerprint @fingerprint.xml --share "
        "\\\\server\\apps=@share",
