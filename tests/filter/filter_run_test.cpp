@@ -25,7 +25,6 @@ class FilterRunTest : public FilterTest {
     });
     filter_.OnProgressUpdate([this](const std::string& update) {
       events_.push_back("P" + Counters(update, "a_name"));
-      if (events_.back() == cancelAt_) filter_.Cancel();
       lastProgress_ = update;
     });
   }
@@ -47,7 +46,6 @@ class FilterRunTest : public FilterTest {
 
   std::vector<std::string> events_;
   std::string lastProgress_, lastResults_;
-  std::string cancelAt_;
 };
 
 const std::string kOutside = Application("Outside", "5 1 2 1 1|6 1 2 1 1");
@@ -69,18 +67,6 @@ TEST_F(FilterRunTest, ReportsEachApplicationLeftWithAVersionAndCountsEveryApplic
   EXPECT_EQ(lastResults_, matches->Xml());
   EXPECT_THAT(ValuesOf(*matches, "//a", "v_id"), ElementsAre("1", "0", "3", "<absent>"));
   EXPECT_EQ(matches->AsNode().SelectSingleNode("/*/a").Xml(), kOutside);
-}
-
-TEST_F(FilterRunTest, ACancelStopsBeforeTheNextApplicationAndTheLastReportFollows) {
-  auto matches = Parse(ThreeApplications());
-  cancelAt_ = "PA:4/1";
-  RunToEnd(LowWeights, matches);
-  EXPECT_THAT(events_, ElementsAre("S1:0/0", "S2:4/0", "PA:4/1", "S255:4/1"));
-  EXPECT_EQ(filter_.Status(), kStatusCancelled);
-  EXPECT_THAT(ValuesOf(*matches, "//a", "a_manage"),
-              ElementsAre("1", "<absent>", "<absent>", "<absent>"));
-  EXPECT_THAT(ValuesOf(*matches, "//a[@a_name='C']/v", "v_weight"), ElementsAre("<absent>"));
-  EXPECT_EQ(lastResults_, matches->Xml());
 }
 
 }  // namespace

@@ -36,12 +36,5 @@ TEST(ErrorHandlerTest, ForceIgnoreOverridesTheReportersAnswer) {
   ReleaseSharedReporter();  // the next test gets a reporter with its usual answer
 }
 
-TEST(ErrorHandlerTest, OwnNumbersAreTheObjectErrorBasePlusTheirOffsets) {
-  const std::vector<int32_t> own{kErrUnableToLoadResults, kErrUnableToCreate, kErrPathNotFound,
-                                 kErrNotSupported, kErrUnknownPropertyType};
-  EXPECT_EQ(std::vector<uint32_t>(own.begin(), own.end()),
-            (std::vector<uint32_t>{0x80040201, 0x80044EE8, 0x80044EE9, 0x80044EEA, 0x80044EEB}));
-}
-
 }  // namespace
 }  // namespace trl

@@ -21,15 +21,6 @@ TEST(FixNullsTest, OnlyAnAbsentValueTakesTheDefault) {
   EXPECT_EQ(FixNulls<std::string>(std::string(), "33"), "");
 }
 
-TEST(CalculateWeightMaskTest, WeightsBecomeBitValues) {
-  struct Case {
-    int32_t weight;
-    int32_t bit;
-  } cases[] = {{-3, 0},    {0, 0},      {1, 1},      {2, 2},           {3, 4},        {8, 128},
-               {14, 8192}, {15, 16384}, {16, 16384}, {1000000, 16384}, {INT32_MIN, 0}};
-  for (const auto& c : cases) EXPECT_EQ(CalculateWeightMask(c.weight), c.bit) << c.weight;
-}
-
 class AddEventsXmlTest : public ::testing::Test {
  protected:
   void SetUp() override { ReleaseSharedReporter(); }

@@ -23,10 +23,10 @@ inline std::string Place(std::string_view computer, std::string_view drive, std:
          std::string(applications) + "</d></m></c>";
 }
 
-// An application with one version; `extra` attributes follow its name.
-inline std::string Application(std::string_view id, std::string_view extra = "") {
-  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) + "'" +
-         std::string(extra) + " v_id='1'><v v_id='1'/></a>";
+// An application with one version.
+inline std::string Application(std::string_view id) {
+  return "<a a_id='" + std::string(id) + "' a_name='App" + std::string(id) +
+         "' v_id='1'><v v_id='1'/></a>";
 }
 
 inline std::string Results(std::string_view body, std::string_view rootAttributes = "") {

@@ -7,7 +7,6 @@
 
 #include "merge/merge_fixture.h"
 #include "platform/event_loop.h"
-#include "platform/failure.h"
 
 namespace trl::testing {
 namespace {
@@ -101,17 +100,6 @@ TEST_F(MergeRunTest, ReportsTheMissingThenEachMergedApplication) {
   EXPECT_EQ(All(), "e_mode=4 e_status=3 " + kCounts + "2 e_match_missing=1");
   EXPECT_EQ(Shape(Parse(lastResults_)->DocumentElement()), "c1(m1(d1(a8 a9))) missing(3 7)");
   EXPECT_THAT(TakeReportedEvents(), IsEmpty());
-}
-
-TEST_F(MergeRunTest, TheNameIsReadOnlyForTheProgressOfAnAsynchronousRun) {
-  const std::string nameless = Place("Host", "C:", "\\App\\", "<a a_id='8' v_id='1'/>");
-  EXPECT_THAT(MergeNow(Parse("<o/>"), nullptr, Parse(Results("")), Parse(Results(nameless))).events,
-              IsEmpty());
-  RunToEnd(Parse("<o/>"), Parse(Results("")), Parse(Results(nameless)));
-  auto events = TakeReportedEvents();
-  ASSERT_EQ(events.size(), 1u);
-  EXPECT_EQ(events[0].number, kInvalidUseOfNull);
-  EXPECT_EQ(events[0].procedure, "Merge");
 }
 
 TEST_F(MergeRunTest, CancelCompletesTheApplicationInProgressAndLeavesTheRest) {
