@@ -3,16 +3,21 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <fstream>
+#include <functional>
 #include <iterator>
+#include <map>
 
 #include "command_error.h"
+#include "compare_command.h"
 #include "document_check.h"
 #include "document_files.h"
 #include "document_kind.h"
+#include "filter_command.h"
 #include "fingerprint_command.h"
 #include "inventory_command.h"
 #include "locate_command.h"
 #include "manage_command.h"
+#include "merge_command.h"
 #include "native_path.h"
 #include "path_search_options.h"
 #include "search_command.h"
@@ -91,12 +96,13 @@ class DocumentFilesTest : public ::testing::Test {
     for (auto& arg : args) {
       if (arg.starts_with("@")) arg = tree_.Native(arg.substr(1));
     }
+    static const std::map<std::string, std::function<std::function<int()>(CLI::App&)>> kCommands{
+        {"search", AddSearchCommand},       {"compare", AddCompareCommand},
+        {"filter", AddFilterCommand},       {"merge", AddMergeCommand},
+        {"locate", AddLocateCommand},       {"fingerprint", AddFingerprintCommand},
+        {"inventory", AddInventoryCommand}, {"manage", AddManageCommand}};
     CLI::App app;
-    auto run = args[0] == "locate"      ? AddLocateCommand(app)
-               : args[0] == "inventory" ? AddInventoryCommand(app)
-               : args[0] == "manage"    ? AddManageCommand(app)
-               : args[0] == "search"    ? AddSearchCommand(app)
-                                        : AddFingerprintCommand(app);
+    auto run = kCommands.at(args[0])(app);
     std::reverse(args.begin(), args.end());
     app.parse(args);
     try {
@@ -130,8 +136,22 @@ TEST_F(DocumentFilesTest, AFileOfAnotherKindIsRefusedBeforeAnythingIsWritten) {
   EXPECT_EQ(Refusal("user.xml", kLocalFilesRole), "");
   for (const char* line :
        {"locate --search-options @search.xml --fingerprint @fp.xml --user-data @fp.xml --save",
-        "fingerprint add --folder @ --app-id 1 --app-name A --version-id 2 --version-name 2 "
-        "--seq 2 --database @search.xml"}) {
+        "locate --search-options @fp.xml", "locate --application-options @fp.xml",
+        "locate --fingerprint @search.xml", "search --search-options @fp.xml",
+        "search @ --fingerprint @search.xml", "search @ --results @fp.xml",
+        "search @ --application-options @search.xml",
+        "compare --local-files @fp.xml "
+        "--fingerprint @fp.xml",
+        "compare --local-files @user.xml --fingerprint @search.xml",
+        "filter --filter 0 --matches @search.xml",
+        "merge --search-options @fp.xml --user-data @user.xml "
+        "--new-results @user.xml",
+        "merge --search-options @search.xml --user-data @fp.xml "
+        "--new-results @user.xml",
+        "merge --search-options @search.xml --user-data @user.xml "
+        "--new-results @search.xml",
+        "fingerprint add --folder @ --app-id 1 --app-name A "
+        "--version-id 2 --version-name 2 --seq 2 --database @search.xml"}) {
     auto [status, message] = Run(line);
     EXPECT_NE(message.find("was given as the"), std::string::npos) << line << ": " << message;
   }
