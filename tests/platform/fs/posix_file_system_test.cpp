@@ -2,10 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <functional>
 #include <tuple>
 
 #include "platform/failure.h"
@@ -137,86 +134,6 @@ TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
     EXPECT_EQ(FailureOf([&] { fs_->GetFile(path); }), getFile);
     EXPECT_EQ(FailureOf([&] { fs_->GetFolder(path); }), getFolder);
   }
-}
-
-TEST_F(PosixFileSystemTest, ItemsThatWentAwayFailWhenUsed) {
-  for (const char* folder : {"gone", "dir"}) tree_.AddFolder(folder);
-  tree_.AddFile("dir/vanishing.txt", "x");
-  auto gone = fs_->GetFolder(tree_.Path("gone"));
-  auto dir = fs_->GetFolder(tree_.Path("dir"));
-  const File& listed = *dir->Files().front();
-  auto lost = fs_->GetFile(tree_.Path("dir/vanishing.txt"));
-  rmdir(tree_.Native("gone").c_str());
-  unlink(tree_.Native("dir/vanishing.txt").c_str());
-  EXPECT_EQ(FailureOf([&] { gone->SubFolders(); }), kPathNotFound);
-  EXPECT_EQ(FailureOf([&] { lost->Open(); }), kFileNotFound);
-  EXPECT_EQ(FailureOf([&] { listed.Size(); }), kFileNotFound);
-}
-
-// Whether `probe` answers `expected` in a child process without root's privileges; nothing when
-// the child cannot give them up.
-std::optional<bool> AnswersUnprivileged(const std::function<std::string()>& probe,
-                                        const std::string& expected) {
-  if (pid_t child = fork(); child == 0) {
-    bool dropped = geteuid() != 0 || (setgid(65534) == 0 && setuid(65534) == 0);
-    std::string answer = dropped ? probe() : "";
-    if (dropped && answer != expected) std::fprintf(stderr, "answered \"%s\"\n", answer.c_str());
-    _exit(dropped ? answer != expected : 2);
-  } else {
-    int status = 0;
-    waitpid(child, &status, 0);
-    if (!WIFEXITED(status) || WEXITSTATUS(status) == 2) return std::nullopt;
-    return WEXITSTATUS(status) == 0;
-  }
-}
-
-TEST_F(PosixFileSystemTest, PermissionProblemsRaise70) {
-  tree_.AddFolder("locked");
-  tree_.AddFile("locked/inner.txt");
-  tree_.AddFile("secret.txt", "s");
-  tree_.SetMode("", 0755);
-  tree_.SetMode("locked", 0700);
-  tree_.SetMode("secret.txt", 0600);
-  std::string locked = tree_.Path("locked");
-  auto answered = AnswersUnprivileged(
-      [&] {
-        auto fs = CreatePosixFileSystem({});
-        return std::to_string(fs->FileExists(locked + R"(\inner.txt)")) + " " +
-               std::to_string(FailureOf([&] { fs->GetFolder(locked)->Files(); })) + " " +
-               std::to_string(FailureOf([&] { fs->GetFile(locked + R"(\inner.txt)"); })) + " " +
-               std::to_string(
-                   FailureOf([&] { fs->GetFile(tree_.Path() + R"(\LOCKED\inner.txt)"); })) +
-               " " +
-               std::to_string(FailureOf([&] { fs->GetFile(tree_.Path("secret.txt"))->Open(); }));
-      },
-      "0 70 70 70 70");
-  if (!answered) GTEST_SKIP() << "cannot give up privileges here";
-  EXPECT_TRUE(*answered);
-}
-
-// Items got by path (listed ones are covered by the walks that list them): each has its bit, and
-// only when the bit is wanted.
-TEST_F(PosixFileSystemTest, AttributesComputeOnlyTheWantedBits) {
-  tree_.AddFolder("rofolder");
-  tree_.AddFolder(".hiddenfolder");
-  for (const char* name : {"plain", "readonly", ".dot"}) tree_.AddFile(name);
-  tree_.AddFifo("pipe");
-  tree_.AddLink("link", "plain");
-  tree_.SetMode("readonly", 0444);
-  tree_.SetMode("rofolder", 0555);
-  std::string all, unwanted;
-  for (const char* name :
-       {"plain", "link", "readonly", ".dot", "pipe", "rofolder", ".hiddenfolder"}) {
-    std::string path = tree_.Path(name);
-    const auto of = [&](uint16_t wanted) {
-      return fs_->FolderExists(path) ? fs_->GetFolder(path)->Attributes(wanted)
-                                     : fs_->GetFile(path)->Attributes(wanted);
-    };
-    all += std::to_string(of(kAllAttributes)) + " ";
-    unwanted += std::to_string(of(kAllAttributes & ~of(kAllAttributes))) + " ";
-  }
-  EXPECT_EQ(all, "0 0 1 2 4 1 2 ");
-  EXPECT_EQ(unwanted, "0 0 0 0 0 0 0 ");
 }
 
 TEST_F(PosixFileSystemTest, ListedItemsCostAStatOnlyForModeSizeOrTime) {
