@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <tuple>
 
@@ -110,7 +111,7 @@ TEST_F(PosixFileSystemTest, OddNamesRoundTripFromNameToGetFile) {
 }
 
 // What a path names decides what the lookups answer: whether a file or a folder exists, and the
-// failure GetFile and GetFolder raise (0: none).
+// failure GetFile and GetFolder raise (0: none), also once the item is gone.
 TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
   tree_.AddFolder("dir");
   tree_.AddFile("file.txt", "x");
@@ -134,6 +135,13 @@ TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
     EXPECT_EQ(FailureOf([&] { fs_->GetFile(path); }), getFile);
     EXPECT_EQ(FailureOf([&] { fs_->GetFolder(path); }), getFolder);
   }
+  // Items that went away after they were got fail when used.
+  auto dir = fs_->GetFolder(tree_.Path("dir"));
+  auto file = fs_->GetFile(tree_.Path("file.txt"));
+  rmdir(tree_.Native("dir").c_str());
+  unlink(tree_.Native("file.txt").c_str());
+  EXPECT_EQ(FailureOf([&] { dir->SubFolders(); }), kPathNotFound);
+  EXPECT_EQ(FailureOf([&] { file->Open(); }), kFileNotFound);
 }
 
 TEST_F(PosixFileSystemTest, ListedItemsCostAStatOnlyForModeSizeOrTime) {
