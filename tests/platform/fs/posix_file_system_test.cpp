@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <tuple>
@@ -142,6 +143,27 @@ TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
   unlink(tree_.Native("file.txt").c_str());
   EXPECT_EQ(FailureOf([&] { dir->SubFolders(); }), kPathNotFound);
   EXPECT_EQ(FailureOf([&] { file->Open(); }), kFileNotFound);
+}
+
+// A locked folder, listed or passed through to resolve a name's case, raises 70 in a child
+// process that gives up root's privileges (exit 2: it could not).
+TEST_F(PosixFileSystemTest, PermissionProblemsRaise70) {
+  tree_.AddFolder("locked");
+  tree_.AddFile("locked/inner.txt");
+  tree_.SetMode("", 0755);
+  tree_.SetMode("locked", 0700);
+  if (pid_t child = fork(); child == 0) {
+    bool dropped = geteuid() != 0 || (setgid(65534) == 0 && setuid(65534) == 0);
+    auto fs = CreatePosixFileSystem({});
+    int listed = FailureOf([&] { fs->GetFolder(tree_.Path("locked"))->Files(); });
+    int resolved = FailureOf([&] { fs->GetFile(tree_.Path() + R"(\LOCKED\inner.txt)"); });
+    _exit(!dropped ? 2 : listed != kPermissionDenied || resolved != kPermissionDenied);
+  } else {
+    int status = 0;
+    waitpid(child, &status, 0);
+    if (WIFEXITED(status) && WEXITSTATUS(status) == 2) GTEST_SKIP() << "cannot give up privileges";
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+  }
 }
 
 TEST_F(PosixFileSystemTest, ListedItemsCostAStatOnlyForModeSizeOrTime) {
