@@ -72,14 +72,14 @@ TEST_F(PosixFileSystemTest, NamesResolveRegardlessOfCaseExactSpellingFirst) {
 TEST_F(PosixFileSystemTest, ListsSkippingFolderLinksAndDanglingLinks) {
   tree_.AddFolder("list/sub");
   tree_.AddFolder("list/other");
-  for (const char* name : {"b.txt", "a.txt", ".hidden"}) tree_.AddFile(std::string("list/") + name);
+  for (const char* name : {"B.txt", "a.txt", ".hidden"}) tree_.AddFile(std::string("list/") + name);
   tree_.AddLink("list/loop", "..");
   tree_.AddLink("list/tofile", "a.txt");
   tree_.AddLink("list/dangling", "nowhere");
   tree_.AddFifo("list/pipe");
   auto folder = fs_->GetFolder(tree_.Path("list"));
   EXPECT_THAT(NamesOf(folder->Files()),
-              UnorderedElementsAre("a.txt", "b.txt", ".hidden", "tofile", "pipe"));
+              UnorderedElementsAre("a.txt", "B.txt", ".hidden", "tofile", "pipe"));
   EXPECT_THAT(NamesOf(folder->SubFolders()), UnorderedElementsAre("sub", "other"));
   for (const auto& file : folder->Files())
     EXPECT_EQ(file->Path(), tree_.Path("list/" + file->Name()));
