@@ -70,10 +70,6 @@ std::string_view LocalFileRecord::Filename() const {
   return index_->NameAt(index_->records_[record_].filename);
 }
 
-std::string_view LocalFileRecord::EncodedFilename() const {
-  return index_->NameAt(index_->records_[record_].encodedFilename);
-}
-
 LocalFileIndex::Matches::Iterator& LocalFileIndex::Matches::Iterator::operator++() {
   record_ = index_->records_[record_].next;
   return *this;
@@ -123,20 +119,21 @@ void LocalFileIndex::AddFile(std::string_view filename, std::string_view encoded
   if (2 * (keys_ + 1) > slots_.size()) Grow();
   // Room first, so that a failing allocation leaves no chain pointing past the records.
   if (records_.size() == records_.capacity()) records_.reserve(records_.size() * 2 + 64);
-  uint32_t encodedAt = AddName(key);
-  uint32_t filenameAt = filename == key ? encodedAt : AddName(filename);
-
   auto record = static_cast<uint32_t>(records_.size());
   uint32_t hash = Hash(key);
   Slot& slot = slots_[Probe(key, hash)];
-  if (slot.first == kNone) {
-    slot = {hash, record, record, encodedAt};
+  bool newKey = slot.first == kNone;
+  // A key's text is kept once, with its slot; a name that equals it shares it.
+  uint32_t keyAt = newKey ? AddName(key) : slot.key;
+  uint32_t filenameAt = filename == key ? keyAt : AddName(filename);
+  if (newKey) {
+    slot = {hash, record, record, keyAt};
     ++keys_;
   } else {
     records_[slot.last].next = record;
     slot.last = record;
   }
-  records_.push_back({static_cast<uint32_t>(folders_.size() - 1), kNone, encodedAt, filenameAt});
+  records_.push_back({static_cast<uint32_t>(folders_.size() - 1), kNone, filenameAt});
 }
 
 LocalFileIndex::Matches LocalFileIndex::Find(std::string_view key) const {

@@ -28,7 +28,6 @@ class LocalFileRecord {
   const std::string& Folder() const;
   const std::string& ExactFolder() const;
   std::string_view Filename() const;
-  std::string_view EncodedFilename() const;
   // The listed folder the record is in: the same for every record of one folder entry.
   uint32_t FolderIndex() const;
   // Where, in a folder the search told from a case sibling's, the case-kept part begins (see
@@ -119,12 +118,11 @@ class LocalFileIndex {
     uint32_t drive;
     size_t caseExactFrom;
   };
-  // 16 bytes; the names are in `names_`, each followed by '\0'. The plain name shares the encoded
-  // one's text when they are equal, as they mostly are.
+  // 12 bytes; the names are in `names_`, each followed by '\0'. The plain name shares its key's
+  // text (kept once, with the key's slot) when they are equal, as they mostly are.
   struct Record {
     uint32_t folder;
     uint32_t next;  // the next record under the same key
-    uint32_t encodedFilename;
     uint32_t filename;
   };
   // One key of the open-addressing table: the first and last records under it, and where its
