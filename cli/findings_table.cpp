@@ -116,7 +116,10 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     Finding finding{Attribute(c, vocab::c_text),
                     Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
                              Attribute(c, vocab::c_local) == "1"),
-                    Attribute(a, vocab::a_name), VersionText(a, names), ""};
+                    Attribute(a, vocab::a_name),
+                    VersionText(a, names),
+                    "",
+                    Attribute(a, vocab::a_id)};
     auto before = entries_.find(key);
     std::string id = Attribute(a, vocab::v_id);
     if (before == entries_.end()) {
@@ -128,16 +131,27 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     findings.push_back(std::move(finding));
   });
 
-  // Applications this run moved to the missing list are no longer in the tree.
+  // Applications this run moved to the missing list are no longer in the tree; those an earlier
+  // run moved there stay listed (the list keeps its entries) even when found again.
   std::multiset<std::string> gone;
+  std::set<std::string> listed;
   xml::Node root = merged.DocumentElement();
   size_t seen = 0;
   if (root) {
     for (xml::Node list : root.ChildElements(vocab::a_missing_list)) {
       for (xml::Node a : list.ChildElements(vocab::a)) {
-        if (seen++ >= missing_) gone.insert(Attribute(a, vocab::a_id));
+        if (seen++ >= missing_) {
+          gone.insert(Attribute(a, vocab::a_id));
+        } else {
+          listed.insert(Attribute(a, vocab::a_id));
+        }
       }
     }
+  }
+  for (Finding& finding : findings) {
+    if (listed.count(finding.applicationId) == 0) continue;
+    finding.change += finding.change.empty() ? "" : "; ";
+    finding.change += "still on the missing list";
   }
   for (const auto& [key, entry] : entries_) {
     if (present.count(key) != 0) continue;

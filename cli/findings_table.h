@@ -12,6 +12,7 @@ namespace trl::cli {
 // what changed since the run before.
 struct Finding {
   std::string computer, folder, application, version, change;
+  std::string applicationId = {};  // not shown
 };
 
 // The applications of a user-data document as they stood before a run, so that the run's changes

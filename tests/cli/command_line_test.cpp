@@ -244,7 +244,13 @@ TEST_F(DocumentFilesTest, AnApplicationSavedFromFoldersIsReportedMissingOnceGone
   ASSERT_EQ(Run(run).first, kExitOk);
   EXPECT_NE(Read("table.txt").find("Tool         1        missing"), std::string::npos)
       << Read("table.txt");
+  tree_.AddFolder("tree/app");
+  tree_.AddFile("tree/app/tool.exe", "x");
+  ASSERT_EQ(Run(run).first, kExitOk);
+  EXPECT_NE(Read("table.txt").find("new; still on the missing list"), std::string::npos)
+      << Read("table.txt");
   tree_.AddFile("user.xml", saved);
+  std::filesystem::remove_all(tree_.Native("tree/app"));
   ASSERT_EQ(Run("manage --user-data @user.xml --off tool").first, kExitOk);
   ASSERT_EQ(Run(run).first, kExitOk);
   EXPECT_EQ(Read("table.txt").find("missing"), std::string::npos) << Read("table.txt");
