@@ -20,7 +20,8 @@ int DaysInMonth(int year, int month) {
 bool ReadNumber(std::string_view text, size_t& pos, int digits, bool atMost, int& out) {
   int value = 0;
   int count = 0;
-  while (pos < text.size() && count < digits && std::isdigit(static_cast<unsigned char>(text[pos]))) {
+  while (pos < text.size() && count < digits &&
+         std::isdigit(static_cast<unsigned char>(text[pos]))) {
     value = value * 10 + (text[pos] - '0');
     ++pos;
     ++count;

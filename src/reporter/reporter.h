@@ -25,9 +25,8 @@ class Reporter {
   // that cannot be written fails with kPermissionDenied (70) or kPathNotFound (76) after the event
   // was recorded.
   int32_t Report(int32_t number, std::string_view description, int32_t kind,
-                 std::string_view component, std::string_view className,
-                 std::string_view procedure, bool flag1, bool flag2, std::string_view source,
-                 int32_t lastValue);
+                 std::string_view component, std::string_view className, std::string_view procedure,
+                 bool flag1, bool flag2, std::string_view source, int32_t lastValue);
 
   // The recorded events: "<events><event number=... description=... kind=... component=...
   // class=... procedure=... source=... time=.../>...</events>".
