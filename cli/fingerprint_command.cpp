@@ -17,6 +17,7 @@
 #include "fingerprint_writer.h"
 #include "frame/vocabulary.h"
 #include "import_dpkg_command.h"
+#include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "platform/text.h"
 
@@ -78,7 +79,14 @@ int RunFingerprintAdd(const FingerprintAddOptions& options, bool appNameGiven) {
 
   xml::DocumentPtr database = LoadOrCreateDatabase(options.database);
   auto fileSystem = fs::CreatePosixFileSystem({});
-  xml::Node v = AddReferenceVersion(*database, version, *fileSystem);
+  xml::Node v;
+  try {
+    v = AddReferenceVersion(*database, version, *fileSystem);
+  } catch (const Failure& failure) {
+    // A name or id that XML cannot carry (control characters, bytes that are not UTF-8).
+    throw CommandError(
+        fmt::format("cannot describe the version: {}; nothing was written", failure.what()));
+  }
   ReplaceFileAtomically(options.database, database->Xml(), false);
   fmt::print("{}: application {}, version {} ({}): {} files\n", options.database, version.appId,
              version.versionId, version.versionName, v.CountChildElements(vocab::f));

@@ -1,5 +1,6 @@
 #include <CLI/CLI.hpp>
 #include <cstdio>
+#include <exception>
 #include <functional>
 #include <vector>
 
@@ -42,6 +43,10 @@ int main(int argc, char** argv) {
   } catch (const CommandError& error) {
     std::fprintf(stderr, "trllocator: %s\n", error.what());
     return error.ExitCode();
+  } catch (const std::exception& error) {
+    // Whatever a command did not foresee ends it with a message, never with an abort.
+    std::fprintf(stderr, "trllocator: %s\n", error.what());
+    return kExitFailed;
   }
   std::printf("%s", app.help().c_str());
   return kExitOk;

@@ -21,10 +21,15 @@ std::string Md5Hex(fs::FileReader& reader) {
     Fail(kInvalidArgument, "MD5 digest unavailable");
   }
   // Sized to the file, up to a limit, and not cleared: most files are small and many are hashed.
-  size_t chunk = static_cast<size_t>(std::clamp<uint64_t>(reader.Size(), 1, kDigestChunk));
+  // Never past the size the file had when opened: one that grows meanwhile is not read forever.
+  uint64_t size = reader.Size();
+  size_t chunk = static_cast<size_t>(std::clamp<uint64_t>(size, 1, kDigestChunk));
   std::unique_ptr<unsigned char[]> buffer(new unsigned char[chunk]);
   uint64_t offset = 0;
-  while (size_t got = reader.ReadAt(offset, buffer.get(), chunk)) {
+  while (offset < size) {
+    size_t got = reader.ReadAt(offset, buffer.get(),
+                               static_cast<size_t>(std::min<uint64_t>(chunk, size - offset)));
+    if (got == 0) break;
     EVP_DigestUpdate(context.get(), buffer.get(), got);
     offset += got;
   }

@@ -155,6 +155,12 @@ TEST_F(DocumentFilesTest, AFileOfAnotherKindIsRefusedBeforeAnythingIsWritten) {
     auto [status, message] = Run(line);
     EXPECT_NE(message.find("was given as the"), std::string::npos) << line << ": " << message;
   }
+  tree_.AddFolder("ref");
+  tree_.AddFile("ref/a");
+  auto [status, message] =
+      Run("fingerprint add --folder @ref --app-id 2 --app-name \x1b[31mred --version-id 1 "
+          "--version-name 1 --seq 1 --database @fp.xml");
+  EXPECT_EQ(status, kExitBadInput) << message;
   EXPECT_EQ(Read("fp.xml"), fingerprint);
   EXPECT_EQ(Read("search.xml"), search);
 }

@@ -4,6 +4,8 @@
 
 #include <map>
 
+#include "platform/failure.h"
+#include "schema/schema.h"
 #include "search/search_fixture.h"
 #include "trl/compare.h"
 
@@ -121,6 +123,13 @@ TEST_F(DiskTest, ExcludedFoldersAreNotWalked) {
                                 "<d_search_exclude>" +
                                     tree_.Native("b") + "/*</d_search_exclude>"));
   EXPECT_EQ(Summary(*local, tree_.Path()), "\\a\\keep\\ f|\\c\\ f");
+}
+
+// A property read touches regular files only: a link to /dev/zero is not hashed for ever.
+TEST_F(DiskTest, OnlyRegularFilesAreRead) {
+  tree_.AddLink("z", "/dev/zero");
+  auto fileSystem = fs::CreatePosixFileSystem({});
+  EXPECT_THROW(Schema().ReadPropertyType3(*fileSystem->GetFile(tree_.Path("z"))), Failure);
 }
 
 }  // namespace

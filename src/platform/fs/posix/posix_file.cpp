@@ -62,7 +62,12 @@ std::unique_ptr<FileReader> PosixFile::Open() const {
   // O_NONBLOCK keeps opening a fifo from waiting for a writer; it changes nothing for files.
   int descriptor = ::open(Native().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
   if (descriptor < 0) Fail(LookupFailure(errno, kFileNotFound));
-  return std::make_unique<PosixFileReader>(descriptor);
+  auto reader = std::make_unique<PosixFileReader>(descriptor);
+  // Only a regular file has an end to read to: a device (a link to /dev/zero) would be read
+  // forever.
+  struct stat status {};
+  if (::fstat(descriptor, &status) != 0 || !S_ISREG(status.st_mode)) Fail(kPathFileAccessError);
+  return reader;
 }
 
 const ItemStatus& PosixFile::Status() const {
