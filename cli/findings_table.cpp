@@ -11,6 +11,7 @@
 
 #include "frame/vocabulary.h"
 #include "native_path.h"
+#include "terminal_text.h"
 
 namespace trl::cli {
 namespace {
@@ -169,7 +170,13 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
   return findings;
 }
 
-std::string FindingsTable(const std::vector<Finding>& findings) {
+std::string FindingsTable(const std::vector<Finding>& found) {
+  // What the documents and the disk hold may carry control characters: shown as escapes.
+  std::vector<Finding> findings;
+  for (const Finding& f : found) {
+    findings.push_back({Printable(f.computer), Printable(f.folder), Printable(f.application),
+                        Printable(f.version), Printable(f.change)});
+  }
   const std::array<std::string, 5> heading{"COMPUTER", "FOLDER", "APPLICATION", "VERSION",
                                            "CHANGE"};
   std::array<size_t, 5> width{};

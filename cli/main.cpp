@@ -14,6 +14,7 @@
 #include "manage_command.h"
 #include "merge_command.h"
 #include "search_command.h"
+#include "terminal_text.h"
 #include "version.h"
 
 int main(int argc, char** argv) {
@@ -41,11 +42,11 @@ int main(int argc, char** argv) {
       if (int code = command(); code >= 0) return code;
     }
   } catch (const CommandError& error) {
-    std::fprintf(stderr, "trllocator: %s\n", error.what());
+    std::fprintf(stderr, "trllocator: %s\n", Printable(error.what()).c_str());
     return error.ExitCode();
   } catch (const std::exception& error) {
     // Whatever a command did not foresee ends it with a message, never with an abort.
-    std::fprintf(stderr, "trllocator: %s\n", error.what());
+    std::fprintf(stderr, "trllocator: %s\n", Printable(error.what()).c_str());
     return kExitFailed;
   }
   std::printf("%s", app.help().c_str());

@@ -12,6 +12,7 @@
 #include "platform/fs/posix/posix_file_system.h"
 #include "platform/fs/share_table.h"
 #include "reporter/reporter.h"
+#include "terminal_text.h"
 
 namespace trl::cli {
 
@@ -81,14 +82,14 @@ ReportPrinter::ReportPrinter(const StageOptions& options, std::function<void()> 
     if (event.kind == Reporter::kFailure) ++*failures;
     if (!shown) return;
     if (beforePrint) beforePrint();
+    std::string description = Printable(ForPeople(event.description));
     if (event.kind == Reporter::kWarning) {
-      fmt::print(stderr, "trllocator: warning: {}\n", ForPeople(event.description));
+      fmt::print(stderr, "trllocator: warning: {}\n", description);
     } else if (event.kind == Reporter::kFailure) {
       fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
-                 event.number, ForPeople(event.description));
+                 event.number, description);
     } else {
-      fmt::print(stderr, "trllocator: {}.{}: {}\n", event.className, event.procedure,
-                 event.description);
+      fmt::print(stderr, "trllocator: {}.{}: {}\n", event.className, event.procedure, description);
     }
   });
 }

@@ -23,6 +23,7 @@
 #include "search_command.h"
 #include "support/documents.h"
 #include "support/temp_tree.h"
+#include "terminal_text.h"
 
 namespace trl::cli {
 namespace {
@@ -113,6 +114,11 @@ class DocumentFilesTest : public ::testing::Test {
   }
   testing::TempTree tree_;
 };
+
+TEST(PrintableTest, ControlsAndBytesThatAreNotUtf8AreEscaped) {
+  EXPECT_EQ(Printable("a\x1b[31mb\x7f\xc2\x9b\xff\xc3\xa9\xe2\x82"),
+            "a\\x1b[31mb\\x7f\\xc2\\x9b\\xff\xc3\xa9\\xe2\\x82");
+}
 
 // A document is refused, naming the file and what it holds, for an option that takes another
 // kind, and nothing is written: neither the fingerprint a locate would save over nor the search
