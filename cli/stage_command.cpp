@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 
 #include <cstdio>
+#include <unordered_set>
 
 #include "command_error.h"
 #include "document_files.h"
@@ -72,25 +73,61 @@ std::string ForPeople(std::string_view description) {
   return text;
 }
 
+// How a failure reads: which file it was about and what went wrong, the number and the operation
+// only for those who asked for every detail.
+std::string FailureLine(const ReportedEventView& event, const std::string& description,
+                        bool verbose) {
+  std::string line = "trllocator: error";
+  if (verbose)
+    line += fmt::format(" in {}.{} ({})", event.className, event.procedure, event.number);
+  if (!event.subject.empty()) {
+    std::string path =
+        event.subject.starts_with("\\\\") ? std::string(event.subject) : NativePath(event.subject);
+    line += fmt::format(": '{}'", Printable(path));
+  }
+  line += ": " + description;
+  if (event.number == kPermissionDenied) {
+    line += " (run as a user who may read it, or leave it out with --exclude)";
+  }
+  return line;
+}
+
+// Lines already printed, so that a failure reported once for each version that looks at the same
+// file is shown once. Bounded: past the bound every line is printed.
+class PrintedLines {
+ public:
+  bool Insert(const std::string& line) {
+    if (lines_.size() >= kMaxRemembered) return true;
+    return lines_.insert(line).second;
+  }
+
+ private:
+  static constexpr size_t kMaxRemembered = 10000;
+  std::unordered_set<std::string> lines_;
+};
+
 }  // namespace
 
 ReportPrinter::ReportPrinter(const StageOptions& options, std::function<void()> beforePrint) {
   ObserveReports([beforePrint = std::move(beforePrint), failures = failures_, quiet = options.quiet,
-                  verbose = options.verbose](const ReportedEventView& event) {
+                  verbose = options.verbose,
+                  printed = std::make_shared<PrintedLines>()](const ReportedEventView& event) {
     bool shown = event.kind == Reporter::kFailure || (event.kind == Reporter::kWarning && !quiet) ||
                  (event.kind == Reporter::kLog && verbose);
     if (event.kind == Reporter::kFailure) ++*failures;
     if (!shown) return;
-    if (beforePrint) beforePrint();
     std::string description = Printable(ForPeople(event.description));
+    std::string line;
     if (event.kind == Reporter::kWarning) {
-      fmt::print(stderr, "trllocator: warning: {}\n", description);
+      line = "trllocator: warning: " + description;
     } else if (event.kind == Reporter::kFailure) {
-      fmt::print(stderr, "trllocator: error in {}.{} ({}): {}\n", event.className, event.procedure,
-                 event.number, description);
+      line = FailureLine(event, description, verbose);
     } else {
-      fmt::print(stderr, "trllocator: {}.{}: {}\n", event.className, event.procedure, description);
+      line = fmt::format("trllocator: {}.{}: {}", event.className, event.procedure, description);
     }
+    if (!verbose && !printed->Insert(line)) return;
+    if (beforePrint) beforePrint();
+    fmt::print(stderr, "{}\n", line);
   });
 }
 

@@ -1,5 +1,7 @@
 // Scoring one local file against a fingerprint file, and recording the find in the results.
 
+#include <optional>
+
 #include "compare/compare_names.h"
 #include "compare/file_facts.h"
 #include "compare/fingerprint_file.h"
@@ -71,6 +73,7 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
   auto& seen = filesSeen_[path];
   if (!seen) seen = std::make_unique<LocalFileFacts>();
   LocalFileFacts& facts = *seen;
+  std::optional<ReportSubject> subject(std::in_place, path);
   bool exists = false;
   if (!on([&] { exists = facts.exists.Get([&] { return Use(objFSO).FileExists(path); }); }) ||
       !exists) {
@@ -79,7 +82,10 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
   const fs::File* file = nullptr;
   on([&] { file = facts.file.Get([&] { return objFSO->GetFile(path); }).get(); });
   for (const FingerprintFile::Property& property : f.Properties()) {
+    // A fingerprint that could not be read is not about the local file.
+    subject.reset();
     for (const auto& failure : property.readFailures) FingerprintFile::Replay(on, failure);
+    subject.emplace(path);
     bool agrees = false;
     on([&] { agrees = PropertyAgrees(property, Use(objSchema), file, facts); });
     if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });

@@ -8,6 +8,7 @@ namespace {
 
 thread_local std::unique_ptr<Reporter> sharedReporter;
 thread_local std::function<void(const ReportedEventView&)> reportObserver;
+thread_local const ReportSubject* currentSubject = nullptr;
 
 }  // namespace
 
@@ -18,6 +19,12 @@ void ReleaseSharedReporter() { sharedReporter.reset(); }
 void ObserveReports(std::function<void(const ReportedEventView&)> observer) {
   reportObserver = std::move(observer);
 }
+
+ReportSubject::ReportSubject(std::string_view path) : path_(path), outer_(currentSubject) {
+  currentSubject = this;
+}
+
+ReportSubject::~ReportSubject() { currentSubject = outer_; }
 
 void ShowObserver(const ReportedEventView& event) {
   if (reportObserver) reportObserver(event);
@@ -34,7 +41,10 @@ int32_t HandleEvent(int32_t number, std::string_view description, int32_t kind,
   }
   int32_t action = sharedReporter->Report(number, description, kind, component, className,
                                           procedure, flag1, flag2, source, lastValue);
-  ShowObserver({number, description, kind, className, procedure});
+  if (reportObserver) {
+    std::string_view subject = currentSubject != nullptr ? currentSubject->path_ : "";
+    reportObserver({number, description, kind, className, procedure, subject});
+  }
   return forceIgnore ? kActionIgnore : action;
 }
 

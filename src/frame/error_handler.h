@@ -45,10 +45,28 @@ struct ReportedEventView {
   int32_t kind;
   std::string_view className;
   std::string_view procedure;
+  std::string_view subject;  // the path the operation was working on, or "" (see ReportSubject)
 };
 void ObserveReports(std::function<void(const ReportedEventView&)> observer);
 // Shows the observer an event reported to a reporter of its own (Locate's run log).
 void ShowObserver(const ReportedEventView& event);
+
+// Names the folder or file (in the "\\" form) this thread is working on while it lives, so that a
+// host can say which one a failure reported meanwhile is about. The text must outlive it; subjects
+// nest.
+class ReportSubject {
+ public:
+  explicit ReportSubject(std::string_view path);
+  ~ReportSubject();
+  ReportSubject(const ReportSubject&) = delete;
+  ReportSubject& operator=(const ReportSubject&) = delete;
+
+ private:
+  std::string_view path_;
+  const ReportSubject* outer_;
+  friend int32_t HandleEvent(int32_t, std::string_view, int32_t, std::string_view, std::string_view,
+                             std::string_view, bool, bool, std::string_view, int32_t, bool);
+};
 
 // Reports a warning (kind 2) of `className`.`procedure` through HandleEvent and goes on.
 void ReportWarning(int32_t number, std::string_view description, std::string_view className,

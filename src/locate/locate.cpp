@@ -225,7 +225,7 @@ void Locate::LogEvent(std::string_view message, std::string_view label) {
     Use(reporter_.get())
         .Report(0, message, Reporter::kLog, kComponentName, kClass, label, true, true, "", 0);
   });
-  ShowObserver({0, message, Reporter::kLog, kClass, label});
+  ShowObserver({0, message, Reporter::kLog, kClass, label, {}});
 }
 
 }  // namespace trl

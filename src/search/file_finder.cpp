@@ -96,6 +96,7 @@ void Search::FindFiles(const std::string& path, xml::Node parent, const std::str
                   search::kFindFilesLabel);
     return;
   }
+  ReportSubject subject(path);
   std::unique_ptr<fs::Folder> folder;
   if (!on([&] { folder = fileSystem.GetFolder(path); })) return;
   bool searched = false;
@@ -195,6 +196,9 @@ bool Search::AddFile(xml::Node folder, const fs::File& file, int16_t properties)
     return false;
   }
   if (properties == 0) return true;
+  std::string path;
+  on([&] { path = file.Path(); });
+  ReportSubject subject(path);
   Schema& schema = *objSchema;
   on([&] {
     if ((properties & 1) != 0) schema.AddProperty(1, schema.ReadPropertyType1(file), entry);

@@ -1,4 +1,5 @@
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
@@ -234,6 +235,20 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
   EXPECT_EQ(status, kExitBadInput);
   EXPECT_EQ(message,
             "cannot write the log '" + tree_.Native("none/x.log") + "': No such file or directory");
+  // A file that cannot be read is named, once, though every version that looks at it reports it.
+  std::filesystem::remove(tree_.Native("app/tool.exe"));
+  ASSERT_EQ(mkfifo(tree_.Native("app/tool.exe").c_str(), 0600), 0);
+  std::string version =
+      "<f f_id='1' f_name='tool.exe' f_relpath='' f_weight='1'><p p_type='3' "
+      "p_weight='1' p_value='x'/></f></v>";
+  tree_.AddFile("fp.xml", "<fp><a a_id='1' a_name='Tool'><v v_id='1' v_name='1' v_seq='1'>" +
+                              version + "<v v_id='2' v_name='2' v_seq='2'>" + version +
+                              "</a></fp>");
+  ::testing::internal::CaptureStderr();
+  EXPECT_EQ(Run("locate @app --fingerprint @fp.xml --sync --output @out.xml").first,
+            kExitFailuresReported);
+  EXPECT_EQ(::testing::internal::GetCapturedStderr(),
+            "trllocator: error: '" + tree_.Native("app/tool.exe") + "': Path/File access error\n");
 }
 
 // An application found and saved on a run over folders is watched from then on: once its folder is
