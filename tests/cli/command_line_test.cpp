@@ -187,6 +187,10 @@ TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
   // A folder the documents hold lower-cased is shown as the disk spells it, in its own bytes.
   EXPECT_EQ(NativePath(testing::Lower(tree_.Path("My Dir/CLI\xff")) + "\\"),
             tree_.Native("My Dir/CLI\xff") + "/");
+  tree_.AddFile("My Dir/CLI\xff/inside");
+  ASSERT_EQ(Run("search . --exclude CLI* -o @out.xml").first, kExitOk);
+  EXPECT_EQ(Read("out.xml").find("inside"), std::string::npos);
+  EXPECT_NE(Read("out.xml").find("f_text=\"file\""), std::string::npos);
   EXPECT_THROW(SearchOptionsForPaths({"file"}), CommandError);
   EXPECT_THROW(SearchOptionsForPaths({"none"}), CommandError);
   // A warning names the folder natively, in the case the disk has where it exists.
