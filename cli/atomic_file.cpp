@@ -2,27 +2,51 @@
 
 #include <fcntl.h>
 #include <fmt/format.h>
+#include <glob.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <filesystem>
+#include <random>
 
 #include "command_error.h"
 
 namespace trl::cli {
 namespace {
 
+// Every temporary a replacement makes is "<file><kTemporaryMark>XXXXXX", so that one left behind
+// is recognised; its writer holds a lock on it for as long as it lives.
+constexpr const char* kTemporaryMark = ".trl-";
+
 [[noreturn]] void Fail(const std::string& what, const std::string& path, int error) {
   throw CommandError(fmt::format("cannot {} '{}': {}", what, path, std::strerror(error)),
                      kExitFailed);
 }
 
-bool WriteAll(int fd, const std::string& text) {
-  const char* data = text.data();
-  size_t left = text.size();
+class Descriptor {
+ public:
+  explicit Descriptor(int fd) : fd_(fd) {}
+  ~Descriptor() {
+    if (fd_ >= 0) ::close(fd_);
+  }
+  Descriptor(const Descriptor&) = delete;
+  Descriptor& operator=(const Descriptor&) = delete;
+  int Get() const { return fd_; }
+  // Closes now, answering errno on failure (a late write error of some file systems shows here).
+  int Close() {
+    int fd = fd_;
+    fd_ = -1;
+    return ::close(fd) == 0 ? 0 : errno;
+  }
+
+ private:
+  int fd_;
+};
+
+bool WriteAll(int fd, const char* data, size_t left) {
   while (left > 0) {
     ssize_t written = ::write(fd, data, left);
     if (written < 0) {
@@ -38,55 +62,155 @@ bool WriteAll(int fd, const std::string& text) {
 // Makes a rename in the folder of `path` durable.
 void SyncFolderOf(const std::string& path) {
   std::filesystem::path folder = std::filesystem::path(path).parent_path();
-  int fd = ::open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY);
+  int fd = ::open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   if (fd < 0) return;  // the rename stands; only its durability across a power cut is less sure
   ::fsync(fd);
   ::close(fd);
 }
 
-}  // namespace
-
-void ReplaceFileAtomically(const std::string& path, const std::string& text, bool keepBackup) {
-  std::string temporary = path + ".XXXXXX";
-  int fd = ::mkstemp(temporary.data());
-  if (fd < 0) Fail("create a file beside", path, errno);
-
-  // The replacement keeps the permissions of the file it replaces; a new file gets the usual ones.
-  struct stat existing {};
-  if (::stat(path.c_str(), &existing) == 0) {
-    ::fchmod(fd, existing.st_mode & 07777);
-  } else {
+// Gives the new file what the old one had. Changing the owner needs privilege: without it the
+// file is the writer's own, as any file the writer makes.
+void KeepOwnership(int fd, const struct stat* existing) {
+  if (existing == nullptr) {
     mode_t mask = ::umask(0);
     ::umask(mask);
     ::fchmod(fd, 0666 & ~mask);
+    return;
   }
-  bool written = WriteAll(fd, text) && WriteAll(fd, "\n") && ::fsync(fd) == 0;
-  int error = errno;
-  if (::close(fd) != 0 && written) {
-    written = false;
-    error = errno;
+  if (existing->st_uid != ::geteuid() || existing->st_gid != ::getegid()) {
+    (void)::fchown(fd, existing->st_uid, existing->st_gid);
   }
-  if (!written) {
-    ::unlink(temporary.c_str());
-    Fail("write", temporary, error);
-  }
+  ::fchmod(fd, existing->st_mode & 07777);
+}
 
-  if (keepBackup && ::access(path.c_str(), F_OK) == 0) {
-    std::string backup = path + ".bak";
-    // A hard link keeps the old content under the backup name while `path` is replaced below.
-    ::unlink(backup.c_str());
-    if (::link(path.c_str(), backup.c_str()) != 0) {
-      error = errno;
-      ::unlink(temporary.c_str());
-      Fail("keep a backup of", path, error);
+// A new temporary beside `file`, locked by this process.
+int MakeTemporary(const std::string& file, std::string& name) {
+  name = file + kTemporaryMark + "XXXXXX";
+  int fd = ::mkostemp(name.data(), O_CLOEXEC);
+  if (fd >= 0) ::flock(fd, LOCK_EX);
+  return fd;
+}
+
+// Removes the temporaries of `file` whose writer is gone: one that is still locked is being
+// written.
+void RemoveStrayTemporaries(const std::string& file) {
+  std::string pattern;
+  for (char c : file + kTemporaryMark) {
+    if (c == '*' || c == '?' || c == '[' || c == '\\') pattern += '\\';
+    pattern += c;
+  }
+  pattern += "??????";
+  glob_t found{};
+  if (::glob(pattern.c_str(), GLOB_NOSORT, nullptr, &found) == 0) {
+    for (size_t i = 0; i < found.gl_pathc; ++i) {
+      const char* name = found.gl_pathv[i];
+      int fd = ::open(name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+      if (fd < 0) continue;
+      struct stat status {};
+      if (::fstat(fd, &status) == 0 && S_ISREG(status.st_mode) &&
+          (status.st_uid == ::geteuid() || ::geteuid() == 0) &&
+          ::flock(fd, LOCK_EX | LOCK_NB) == 0) {
+        ::unlink(name);
+      }
+      ::close(fd);
     }
   }
-  if (::rename(temporary.c_str(), path.c_str()) != 0) {
+  ::globfree(&found);
+}
+
+// Copies the content of `file` into `fd`, for a backup where a hard link is refused.
+bool CopyInto(const std::string& file, int fd) {
+  Descriptor source(::open(file.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+  if (source.Get() < 0) return false;
+  char buffer[1 << 16];
+  for (;;) {
+    ssize_t got = ::read(source.Get(), buffer, sizeof buffer);
+    if (got == 0) return ::fsync(fd) == 0;
+    if (got < 0) {
+      if (errno == EINTR) continue;
+      return false;
+    }
+    if (!WriteAll(fd, buffer, static_cast<size_t>(got))) return false;
+  }
+}
+
+// Makes "<file>.bak" hold the current content of `file`. The old backup is replaced by a rename,
+// so it stays until the new one exists.
+void KeepBackup(const std::string& file, const struct stat& existing) {
+  std::string backup = file + ".bak";
+  std::string linked = backup + kTemporaryMark;
+  std::mt19937_64 random{std::random_device{}()};
+  for (int attempt = 0;; ++attempt) {
+    std::string name = linked + fmt::format("{:06x}", random() & 0xffffff);
+    if (::link(file.c_str(), name.c_str()) == 0) {
+      if (::rename(name.c_str(), backup.c_str()) == 0) return;
+      int error = errno;
+      ::unlink(name.c_str());
+      Fail("keep a backup of", file, error);
+    }
+    if (errno != EEXIST || attempt == 8) break;
+  }
+  // No hard link here (a file system without them, or one the system protects): a copy.
+  std::string name;
+  Descriptor fd(MakeTemporary(backup, name));
+  if (fd.Get() < 0) Fail("keep a backup of", file, errno);
+  KeepOwnership(fd.Get(), &existing);
+  if (!CopyInto(file, fd.Get()) || ::rename(name.c_str(), backup.c_str()) != 0) {
+    int error = errno;
+    ::unlink(name.c_str());
+    Fail("keep a backup of", file, error);
+  }
+}
+
+}  // namespace
+
+std::string SaveTarget(const std::string& path) {
+  struct stat status {};
+  if (::lstat(path.c_str(), &status) != 0 || !S_ISLNK(status.st_mode)) return path;
+  std::error_code error;
+  std::filesystem::path target = std::filesystem::weakly_canonical(path, error);
+  if (error) Fail("follow the link", path, error.value());
+  return target.string();
+}
+
+void ReplaceFileAtomically(const std::string& path, const std::string& text,
+                           const Replacement& how) {
+  std::string file = how.throughLink ? SaveTarget(path) : path;
+  struct stat existing {};
+  bool exists = ::lstat(file.c_str(), &existing) == 0;
+  if (exists && S_ISLNK(existing.st_mode)) exists = false;  // replaced itself, never followed
+  if (exists && !S_ISREG(existing.st_mode)) {
+    throw CommandError(fmt::format("cannot replace '{}': it is not a regular file", file),
+                       kExitFailed);
+  }
+
+  RemoveStrayTemporaries(file);
+  std::string temporary;
+  Descriptor fd(MakeTemporary(file, temporary));
+  if (fd.Get() < 0) Fail("write", file, errno);
+  KeepOwnership(fd.Get(), exists ? &existing : nullptr);
+  bool written = WriteAll(fd.Get(), text.data(), text.size()) && WriteAll(fd.Get(), "\n", 1) &&
+                 ::fsync(fd.Get()) == 0;
+  int error = errno;
+  if (!written) {
+    ::unlink(temporary.c_str());
+    Fail("write", file, error);
+  }
+  if (how.keepBackup && exists) {
+    try {
+      KeepBackup(file, existing);
+    } catch (const CommandError&) {
+      ::unlink(temporary.c_str());
+      throw;
+    }
+  }
+  if (::rename(temporary.c_str(), file.c_str()) != 0) {
     error = errno;
     ::unlink(temporary.c_str());
-    Fail("replace", path, error);
+    Fail("replace", file, error);
   }
-  SyncFolderOf(path);
+  SyncFolderOf(file);
+  if ((error = fd.Close()) != 0) Fail("write", file, error);
 }
 
 }  // namespace trl::cli

@@ -4,10 +4,24 @@
 
 namespace trl::cli {
 
+// Where a save of `path` goes: the file a link at `path` leads to (a linked user-data file is
+// updated through its link, deliberately), or `path` itself.
+std::string SaveTarget(const std::string& path);
+
+struct Replacement {
+  // The previous content stays as "<file>.bak", replaced only once the new backup exists.
+  bool keepBackup = false;
+  // A link at the path is written through to its file (saves); otherwise the link itself is
+  // replaced, never what it leads to (outputs).
+  bool throughLink = true;
+};
+
 // Replaces the file at `path` with `text` (and a line end) so that a reader, or a crash, sees
 // either the old content or the new, never a mix: the text goes to a new file beside it, is flushed
-// to disk, and is renamed over `path`. With `keepBackup`, the previous content stays as
-// "<path>.bak". A failure leaves `path` as it was and is a CommandError with kExitFailed.
-void ReplaceFileAtomically(const std::string& path, const std::string& text, bool keepBackup);
+// to disk, and is renamed over the file. The replacement keeps the owner, group and permissions of
+// the file it replaces. Temporaries an earlier run left behind when it was killed are removed
+// first. A failure leaves the file as it was and is a CommandError with kExitFailed.
+void ReplaceFileAtomically(const std::string& path, const std::string& text,
+                           const Replacement& how);
 
 }  // namespace trl::cli

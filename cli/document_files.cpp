@@ -1,6 +1,9 @@
 #include "document_files.h"
 
+#include <fcntl.h>
 #include <fmt/format.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -9,7 +12,9 @@
 #include <fstream>
 #include <memory>
 
+#include "atomic_file.h"
 #include "command_error.h"
+#include "platform/fs/posix/output_open.h"
 
 namespace trl::cli {
 namespace {
@@ -55,15 +60,32 @@ xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const Documen
 }
 
 void WriteTextOutput(const std::string& text, const std::string& path) {
-  std::FILE* stream = path.empty() ? stdout : std::fopen(path.c_str(), "wb");
-  if (stream == nullptr) {
-    throw CommandError(fmt::format("cannot write '{}': {}", path, SystemReason(errno)),
-                       kExitFailed);
+  struct stat status {};
+  bool stream = path.empty() || (::lstat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode) &&
+                                 !S_ISDIR(status.st_mode));
+  if (!stream) {
+    // A file is never truncated before its new text is complete, and a link planted in its place
+    // is replaced rather than written through.
+    ReplaceFileAtomically(path, text, {.keepBackup = false, .throughLink = false});
+    return;
   }
-  bool written = std::fwrite(text.data(), 1, text.size(), stream) == text.size() &&
-                 std::fputc('\n', stream) != EOF && std::fflush(stream) == 0;
+  // A terminal, a pipe, a device, or a link to one of them (/dev/stdout).
+  int fd = path.empty() ? ::dup(STDOUT_FILENO) : fs::OpenForWriting(path, 0);
+  if (fd < 0) {
+    throw CommandError(
+        fmt::format("cannot write '{}': {}", path,
+                    errno == ELOOP ? "it is a link to a file; remove the link or name the file"
+                                   : SystemReason(errno)),
+        kExitFailed);
+  }
+  std::FILE* output = ::fdopen(fd, "w");
+  bool written = output != nullptr &&
+                 std::fwrite(text.data(), 1, text.size(), output) == text.size() &&
+                 std::fputc('\n', output) != EOF && std::fflush(output) == 0;
   int error = errno;
-  if (stream != stdout && std::fclose(stream) != 0 && written) {
+  if (output == nullptr) {
+    ::close(fd);
+  } else if (std::fclose(output) != 0 && written) {
     written = false;
     error = errno;
   }

@@ -20,6 +20,7 @@
 #include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "platform/text.h"
+#include "save_lock.h"
 
 namespace trl::cli {
 namespace {
@@ -77,6 +78,7 @@ int RunFingerprintAdd(const FingerprintAddOptions& options, bool appNameGiven) {
   version.fileWeight = options.fileWeight;
   version.replace = options.replace;
 
+  SaveLock lock(options.database);
   xml::DocumentPtr database = LoadOrCreateDatabase(options.database);
   auto fileSystem = fs::CreatePosixFileSystem({});
   xml::Node v;
@@ -87,7 +89,7 @@ int RunFingerprintAdd(const FingerprintAddOptions& options, bool appNameGiven) {
     throw CommandError(
         fmt::format("cannot describe the version: {}; nothing was written", failure.what()));
   }
-  ReplaceFileAtomically(options.database, database->Xml(), false);
+  ReplaceFileAtomically(options.database, database->Xml(), {});
   fmt::print("{}: application {}, version {} ({}): {} files\n", options.database, version.appId,
              version.versionId, version.versionName, v.CountChildElements(vocab::f));
   return kExitOk;

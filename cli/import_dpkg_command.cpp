@@ -13,6 +13,7 @@
 #include "fingerprint_writer.h"
 #include "live_progress.h"
 #include "package_import.h"
+#include "save_lock.h"
 
 namespace trl::cli {
 namespace {
@@ -61,6 +62,7 @@ int RunImportDpkg(const ImportDpkgOptions& options) {
   }
   for (const PackageVersion& archive : archives) selected.push_back(&archive);
 
+  SaveLock lock(options.database);
   xml::DocumentPtr database = LoadOrCreateDatabase(options.database);
   PackageImporter importer(*database, dpkg, options.root);
   for (size_t i = 0; i < selected.size(); ++i) {
@@ -71,7 +73,7 @@ int RunImportDpkg(const ImportDpkgOptions& options) {
   importer.Finish();
   progress.Show("writing", options.database);
   std::string text = database->Xml();
-  ReplaceFileAtomically(options.database, text, false);
+  ReplaceFileAtomically(options.database, text, {});
   progress.Clear();
 
   const ImportCounts& counts = importer.Counts();

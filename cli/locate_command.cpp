@@ -1,12 +1,15 @@
 #include "locate_command.h"
 
+#include <fcntl.h>
 #include <fmt/format.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -20,6 +23,8 @@
 #include "live_progress.h"
 #include "path_search_options.h"
 #include "platform/event_loop.h"
+#include "platform/fs/posix/output_open.h"
+#include "save_lock.h"
 #include "stage_command.h"
 #include "trl/locate.h"
 
@@ -170,11 +175,20 @@ int RunLocate(const LocateOptions& options) {
     throw CommandError("--save needs the user data to save: give --user-data FILE");
   }
   int16_t filter = ParseFilterOptions(options.filter);
+  // Held from the reading of the user data to its replacing: a run saving meanwhile would be lost.
+  std::optional<SaveLock> lock;
+  if (options.save) lock.emplace(options.userData);
   Documents documents = LoadDocuments(options);
-  if (!options.log.empty() && !std::ofstream(options.log, std::ios::app)) {
+  if (!options.log.empty()) {
     // Found out now, rather than reported at every entry of the run.
-    throw CommandError(
-        fmt::format("cannot write the log '{}': {}", options.log, std::strerror(errno)));
+    int fd = fs::OpenForWriting(options.log, O_CREAT | O_APPEND);
+    if (fd < 0) {
+      throw CommandError(fmt::format("cannot write the log '{}': {}", options.log,
+                                     errno == ELOOP ? "it is a link, and a log is not written "
+                                                      "through a link to a file"
+                                                    : std::strerror(errno)));
+    }
+    ::close(fd);
   }
   std::unique_ptr<Inventory> before;
   if (options.format == "table") {
@@ -220,7 +234,8 @@ int RunLocate(const LocateOptions& options) {
     throw CommandError("the locate run did not complete; the user data was not saved", kExitFailed);
   }
 
-  if (options.save) ReplaceFileAtomically(options.userData, documents.userData->Xml(), true);
+  if (options.save)
+    ReplaceFileAtomically(options.userData, documents.userData->Xml(), {.keepBackup = true});
   int status = printer.Failures() > 0 ? kExitFailuresReported : kExitOk;
   try {
     if (options.format == "table") {

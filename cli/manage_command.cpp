@@ -13,6 +13,7 @@
 #include "frame/vocabulary.h"
 #include "native_path.h"
 #include "platform/text.h"
+#include "save_lock.h"
 
 namespace trl::cli {
 namespace {
@@ -40,6 +41,7 @@ bool Names(const xml::Node& a, const std::string& target) {
 }
 
 int Manage(const ManageOptions& options) {
+  SaveLock lock(options.userData);
   auto userData = LoadDocumentFile(options.userData, kUserDataRole);
   std::vector<xml::Node> applications = userData->AsNode().SelectNodes("/*/c/m/d/a");
   std::vector<xml::Node> chosen;
@@ -55,7 +57,7 @@ int Manage(const ManageOptions& options) {
     }
   }
   for (xml::Node& a : chosen) a.SetAttribute(vocab::a_manage, options.off ? "0" : "1");
-  ReplaceFileAtomically(options.userData, userData->Xml(), true);
+  ReplaceFileAtomically(options.userData, userData->Xml(), {.keepBackup = true});
   fmt::print("{} application{} {} watched for going missing\n", chosen.size(),
              chosen.size() == 1 ? "" : "s", options.off ? "no longer" : "now");
   return kExitOk;

@@ -1,16 +1,27 @@
 #include "reporter/log_file.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <cerrno>
 
 #include "platform/failure.h"
+#include "platform/fs/posix/output_open.h"
 
 namespace trl {
 
 void LogFile::Open(const std::string& path, bool replace) {
   Close();
   path_ = path;
-  file_.reset(std::fopen(path.c_str(), replace ? "we" : "ae"));
-  if (file_ == nullptr) FailFromErrno(errno);
+  // A link planted where the log goes is not written through.
+  int fd = fs::OpenForWriting(path, O_CREAT | (replace ? O_TRUNC : O_APPEND));
+  if (fd < 0) FailFromErrno(errno);
+  file_.reset(::fdopen(fd, replace ? "w" : "a"));
+  if (file_ == nullptr) {
+    int error = errno;
+    ::close(fd);
+    FailFromErrno(error);
+  }
 }
 
 void LogFile::Close() { file_.reset(); }

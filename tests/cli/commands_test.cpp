@@ -218,8 +218,9 @@ TEST_F(CommandsTest, SaveReplacesTheUserDataAndKeepsTheOldOneAsBackup) {
   EXPECT_EQ(saved.AsNode().CountNodes("//events"), 0u);
   EXPECT_THAT(Read("out.xml"), ::testing::HasSubstr("</events></trl_applicationdata>"));
   EXPECT_EQ(Read("inventory.xml.bak"), kEmptyUserData);
-  // No temporary file is left beside them: two folders, eight inputs, out.xml and the backup.
-  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Root()), {}), 12);
+  // No temporary file is left beside them: two folders, eight inputs, out.xml, the backup and the
+  // save's lock file.
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Root()), {}), 13);
 }
 
 TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
@@ -263,8 +264,8 @@ TEST_F(CommandsTest, FingerprintAddCreatesThenRewritesTheDatabase) {
   auto written = testing::Parse(Read("db/fp.xml"));
   EXPECT_EQ(testing::ValuesOf(*written, "/trl_fingerprint/a/v", "v_id"), (Strings{"1", "2"}));
   EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
-  // Neither a backup nor a temporary file is left beside the database.
-  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Native("db")), {}), 1);
+  // Neither a backup nor a temporary file is left beside the database, only its lock file.
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Native("db")), {}), 2);
 }
 
 // Contents are RFC 1321 test inputs, so the expected digests are the published ones.

@@ -1,0 +1,115 @@
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <thread>
+
+#include "atomic_file.h"
+#include "command_error.h"
+#include "document_files.h"
+#include "platform/failure.h"
+#include "reporter/log_file.h"
+#include "save_lock.h"
+#include "support/temp_tree.h"
+
+namespace trl::cli {
+namespace {
+
+class SafeWritesTest : public ::testing::Test {
+ protected:
+  std::string Read(std::string_view relative) const {
+    std::ifstream in(tree_.Native(relative), std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), {}};
+  }
+  bool IsLink(std::string_view relative) const {
+    return std::filesystem::is_symlink(tree_.Native(relative));
+  }
+  testing::TempTree tree_;
+};
+
+// Links planted where an output or a log goes are refused, never written through to a file; a
+// link to a stream is written through (as /dev/stdout is). A file is replaced, not truncated.
+TEST_F(SafeWritesTest, OutputsAndLogsDoNotFollowPlantedLinks) {
+  tree_.AddFile("precious.txt", "keep");
+  tree_.AddLink("report.xml", tree_.Native("precious.txt"));
+  EXPECT_THROW(WriteTextOutput("<new/>", tree_.Native("report.xml")), CommandError);
+  EXPECT_EQ(Read("precious.txt"), "keep");
+  tree_.AddFile("old.xml", "<old/>");
+  int reader = ::open(tree_.Native("old.xml").c_str(), O_RDONLY);
+  WriteTextOutput("<new/>", tree_.Native("old.xml"));
+  EXPECT_EQ(Read("old.xml"), "<new/>\n");
+  char kept[6] = {};
+  EXPECT_EQ(::read(reader, kept, sizeof kept), 6);  // the old file was not truncated in place
+  ::close(reader);
+
+  tree_.AddLink("null.xml", "/dev/null");
+  WriteTextOutput("<new/>", tree_.Native("null.xml"));
+  EXPECT_TRUE(IsLink("null.xml"));
+
+  tree_.AddLink("run.log", tree_.Native("precious.txt"));
+  LogFile log;
+  EXPECT_THROW(log.Open(tree_.Native("run.log"), false), Failure);
+  EXPECT_EQ(Read("precious.txt"), "keep");
+}
+
+TEST_F(SafeWritesTest, ASaveKeepsWhatItReplaces) {
+  tree_.AddFolder("data");
+  tree_.AddFile("data/user.xml", "first");
+  tree_.AddFile("data/user.xml.bak", "older");
+  tree_.AddLink("user.xml", tree_.Native("data/user.xml"));
+  tree_.SetMode("data/user.xml", 0640);
+  bool root = ::geteuid() == 0;
+  if (root) ASSERT_EQ(::chown(tree_.Native("data/user.xml").c_str(), 4321, 4321), 0);
+  // Left by a writer that was killed, and one still being written (its writer holds the lock).
+  tree_.AddFile("data/user.xml.trl-Ab12Cd", "stray");
+  tree_.AddFile("data/user.xml.trl-Xy34Zw", "live");
+  int live = ::open(tree_.Native("data/user.xml.trl-Xy34Zw").c_str(), O_RDONLY);
+  ASSERT_EQ(::flock(live, LOCK_EX), 0);
+
+  ReplaceFileAtomically(tree_.Native("user.xml"), "second", {.keepBackup = true});
+  ::close(live);
+  // Through the link, deliberately: the link stays, the file it leads to is replaced.
+  EXPECT_TRUE(IsLink("user.xml"));
+  EXPECT_EQ(Read("data/user.xml"), "second\n");
+  EXPECT_EQ(Read("data/user.xml.bak"), "first");
+  struct stat status {};
+  ASSERT_EQ(::stat(tree_.Native("data/user.xml").c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0640u);
+  if (root) EXPECT_EQ(status.st_uid, 4321u);
+  EXPECT_FALSE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Ab12Cd")));
+  EXPECT_TRUE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Xy34Zw")));
+}
+
+// A second save of the same file waits until the first has replaced it.
+TEST_F(SafeWritesTest, SavesOfOneFileTakeTurns) {
+  tree_.AddFile("user.xml", "first");
+  std::atomic<bool> secondHasIt = false;
+  std::thread second;
+  {
+    SaveLock first(tree_.Native("user.xml"));
+    ::testing::internal::CaptureStderr();
+    second = std::thread([&] {
+      SaveLock lock(tree_.Native("user.xml"));
+      secondHasIt = true;
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    EXPECT_FALSE(secondHasIt);
+  }
+  second.join();
+  EXPECT_TRUE(secondHasIt);
+  EXPECT_EQ(
+      ::testing::internal::GetCapturedStderr(),
+      "trllocator: waiting for another run that is saving '" + tree_.Native("user.xml") + "'\n");
+  tree_.AddLink("other.xml.lock", tree_.Native("user.xml"));
+  EXPECT_THROW(SaveLock(tree_.Native("other.xml")), CommandError);
+}
+
+}  // namespace
+}  // namespace trl::cli
