@@ -100,6 +100,13 @@ xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths) {
     d.SetAttribute(vocab::d_search_f_properties, "0");
     d.SetAttribute(vocab::d_search_links, "1");
     d.AppendChild(document->CreateElement(vocab::d_search_mask));
+    if (absolute == "/") {
+      // The kernel's views of processes and devices: no software is installed there, and some
+      // of their files read without end.
+      for (const char* view : {"/proc", "/sys", "/dev"}) {
+        d.AppendChild(document->CreateElement(vocab::d_search_exclude)).SetText(view);
+      }
+    }
   }
   return document;
 }

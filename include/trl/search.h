@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <unordered_map>
 #include <utility>
@@ -58,9 +59,11 @@ class Search : public Worker {
     int16_t folderMask = 0;
     int16_t fileMask = 0;
     int16_t properties = 0;
-    bool links = false;                 // links to folders are noted
-    std::vector<std::string> excluded;  // globs of folders left out
-    xml::Node computer;                 // the c and m elements of the results being added to
+    bool links = false;                     // links to folders are noted
+    bool fileLinksAnywhere = false;         // links to files are read wherever they lead
+    std::optional<std::string> realFolder;  // the folder entry's real path, once needed
+    std::vector<std::string> excluded;      // globs of folders left out
+    xml::Node computer;                     // the c and m elements of the results being added to
     xml::Node drive;
   };
 
@@ -78,6 +81,8 @@ class Search : public Worker {
   void FindFiles(const std::string& path, xml::Node parent, const std::string& relativePath,
                  bool recurse, int16_t folderMask, int16_t fileMask, int16_t properties);
   bool AddFile(xml::Node folder, const fs::File& file, int16_t properties);
+  // Whether `file` is a link to a file outside the folder entry being walked.
+  bool LeadsOutside(const fs::File& file);
   // Whether the folder at `path` (the component's form) is left out of the walk.
   bool Excluded(const std::string& name, const std::string& path) const;
   // The encoded name of a folder: with its case kept below a folder that has a case sibling.

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "platform/failure.h"
+#include "platform/fs/long_read.h"
 #include "reporter/reporter.h"
 
 namespace trl {
@@ -92,6 +93,8 @@ class OnError {
       return true;
     } catch (const Failure& failure) {
       Report(failure.number, failure.description, failure.source);
+    } catch (const fs::ReadAbandoned&) {
+      // The run was cancelled during the read: nothing went wrong.
     } catch (const std::exception& error) {
       Report(kInvalidArgument, error.what(), kComponentName);
     }

@@ -50,6 +50,7 @@ inline constexpr std::string_view d_search = "d_search";
 inline constexpr std::string_view d_search_d_attributes = "d_search_d_attributes";
 inline constexpr std::string_view d_search_f_attributes = "d_search_f_attributes";
 inline constexpr std::string_view d_search_f_properties = "d_search_f_properties";
+inline constexpr std::string_view d_search_f_links = "d_search_f_links";
 inline constexpr std::string_view d_search_links = "d_search_links";
 inline constexpr std::string_view d_search_recurse = "d_search_recurse";
 inline constexpr std::string_view d_text = "d_text";

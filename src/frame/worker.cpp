@@ -7,6 +7,7 @@
 #include "frame/error_handler.h"
 #include "frame/vocabulary.h"
 #include "platform/event_loop.h"
+#include "platform/fs/long_read.h"
 
 namespace trl {
 
@@ -75,6 +76,11 @@ void Worker::TickSteps() {
     ticker->Enabled(false);
   });
   on([&] { EventLoop::Current().Post([ticker] {}); });
+  // A client's cancel reaches the run inside a long read of one file too.
+  fs::LongReadPoll poll([this] {
+    YieldIfAsynchronous(OnError{className_, "brxTicker_Tick"});
+    return status_ == kStatusCancelled;
+  });
   if (status_ == kStatusStarted) RunBody();
 }
 

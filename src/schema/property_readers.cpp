@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "platform/failure.h"
+#include "platform/fs/long_read.h"
 #include "schema/pe_version.h"
 #include "schema/schema.h"
 
@@ -26,7 +27,12 @@ std::string Md5Hex(fs::FileReader& reader) {
   size_t chunk = static_cast<size_t>(std::clamp<uint64_t>(size, 1, kDigestChunk));
   std::unique_ptr<unsigned char[]> buffer(new unsigned char[chunk]);
   uint64_t offset = 0;
+  uint64_t nextPoll = fs::kLongReadStep;
   while (offset < size) {
+    if (offset >= nextPoll) {
+      fs::PollLongRead();  // a cancel is honoured within a large file, not after it
+      nextPoll += fs::kLongReadStep;
+    }
     size_t got = reader.ReadAt(offset, buffer.get(),
                                static_cast<size_t>(std::min<uint64_t>(chunk, size - offset)));
     if (got == 0) break;

@@ -172,6 +172,24 @@ bool Search::Excluded(const std::string& name, const std::string& path) const {
   });
 }
 
+bool Search::LeadsOutside(const fs::File& file) {
+  OnError on{kClass, search::kAddFileLabel};
+  bool link = false;
+  on([&] { link = file.IsLink(); });
+  if (!link) return false;
+  // Its properties would be those of a file outside what the client asked to have searched (a
+  // planted link to /etc/shadow): left out, as a file the walk cannot see.
+  bool outside = true;
+  on([&] {
+    fs::FileSystem& fileSystem = Use(objFSO);
+    if (!read_.realFolder) read_.realFolder = fileSystem.RealPath(FullPath(read_.folder));
+    std::string folder = *read_.realFolder;
+    if (!folder.ends_with('\\')) folder += '\\';
+    outside = !fileSystem.RealPath(file.Path()).starts_with(folder);
+  });
+  return outside;
+}
+
 std::string Search::EncodedFolder(const std::string& relativePath) const {
   Schema& schema = Use(objSchema);
   return caseExactFrom_ != std::string::npos ? schema.EncodeExactName(relativePath, caseExactFrom_)
@@ -183,6 +201,7 @@ bool Search::AddFile(xml::Node folder, const fs::File& file, int16_t properties)
   std::string name;
   bool matches = false;
   if (!on([&] { name = file.Name(); })) return false;
+  if (properties != 0 && !read_.fileLinksAnywhere && LeadsOutside(file)) return false;
   if (patternUsable_) on([&] { matches = Use(objRegExp).Test(name); });
   if (!matches) return false;
 

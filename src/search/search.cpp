@@ -158,6 +158,8 @@ bool Search::WalkFolderEntry(xml::Node entry) {
     on([&] { r.fileMask = ToInt16(control(vocab::d_search_f_attributes, "33")); });
     on([&] { r.properties = ToInt16(control(vocab::d_search_f_properties, "0")); });
     on([&] { r.links = control(vocab::d_search_links, "0") == "1"; });
+    on([&] { r.fileLinksAnywhere = control(vocab::d_search_f_links, "0") == "1"; });
+    r.realFolder.reset();
     r.excluded.clear();
     for (const xml::Node& glob : entry.ChildElements(vocab::d_search_exclude)) {
       r.excluded.push_back(glob.Text());

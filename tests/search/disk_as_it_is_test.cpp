@@ -2,8 +2,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <chrono>
+#include <filesystem>
 #include <map>
 
+#include "platform/event_loop.h"
 #include "platform/failure.h"
 #include "schema/schema.h"
 #include "search/search_fixture.h"
@@ -130,6 +133,42 @@ TEST_F(DiskTest, OnlyRegularFilesAreRead) {
   tree_.AddLink("z", "/dev/zero");
   auto fileSystem = fs::CreatePosixFileSystem({});
   EXPECT_THROW(Schema().ReadPropertyType3(*fileSystem->GetFile(tree_.Path("z"))), Failure);
+}
+
+// A link to a file is read only when the file lies in the searched folder, unless the options say
+// links may lead anywhere; without properties to read, nothing leaks and every name is recorded.
+TEST_F(DiskTest, FileLinksAreReadOnlyWithinTheSearchedFolder) {
+  tree_.AddFolder("in/sub");
+  tree_.AddFolder("out");
+  tree_.AddFile("in/a", "1");
+  tree_.AddFile("out/secret", "22");
+  tree_.AddLink("in/sub/inside", "../a");
+  tree_.AddLink("in/sub/outside", "../../out/secret");
+  const std::pair<const char*, const char*> cases[] = {
+      {"d_search_f_properties='2'", "\\ a#2|\\sub\\ inside#2"},
+      {"d_search_f_properties='2' d_search_f_links='1'", "\\ a#2|\\sub\\ inside#2 outside#2"},
+      {"", "\\ a|\\sub\\ inside outside"},
+  };
+  for (const auto& [attributes, expected] : cases) {
+    auto local = Run(LocalOptions(tree_.Path("in"), std::string("d_search='1' ") + attributes));
+    EXPECT_EQ(Summary(*local, tree_.Path("in")), expected) << attributes;
+  }
+}
+
+// A cancel reaches a run hashing a huge file while it reads, not after it.
+TEST_F(DiskTest, CancelStopsTheHashingOfAHugeFile) {
+  tree_.AddFile("huge");
+  std::filesystem::resize_file(tree_.Native("huge"), uintmax_t{64} << 30);  // sparse
+  Search search(fs::CreatePosixFileSystem({}));
+  Timer cancel([&] { search.Cancel(); });  // fires once the walk has begun to read
+  cancel.Interval(50);
+  cancel.Enabled(true);
+  search.Start(Parse(LocalOptions(tree_.Path(), "d_search='1' d_search_f_properties='4'")));
+  auto started = std::chrono::steady_clock::now();
+  ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return search.Status() >= kStatusComplete; },
+                                            std::chrono::seconds(60)));
+  EXPECT_EQ(search.Status(), kStatusCancelled);
+  EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(20));
 }
 
 }  // namespace

@@ -44,6 +44,8 @@ class File {
   // Whether its folder's listing holds another file whose name differs from this one only in
   // letter case: such names match alike, yet name different files.
   virtual bool HasCaseSibling() const { return false; }
+  // Whether it is a link to a file rather than the file itself.
+  virtual bool IsLink() const { return false; }
 };
 
 class Folder;

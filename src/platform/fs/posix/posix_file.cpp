@@ -79,6 +79,11 @@ const ItemStatus& PosixFile::Status() const {
   return *status_;
 }
 
+bool PosixFile::IsLink() const {
+  IsSystem();  // learns the type
+  return type_ == DT_LNK;
+}
+
 // A system file is anything but a regular file, a folder or a link, as lstat tells them apart.
 bool PosixFile::IsSystem() const {
   if (type_ == DT_UNKNOWN) {

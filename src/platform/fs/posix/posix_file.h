@@ -36,6 +36,7 @@ class PosixFile final : public File {
   std::string Native() const { return folder_->NativeChild(nativeName_); }
   const ItemStatus& Status() const;
   bool IsSystem() const;
+  bool IsLink() const override;
 
   std::shared_ptr<const FolderPlace> folder_;
   std::string nativeName_;
