@@ -94,16 +94,67 @@ std::string VersionText(const xml::Node& a, const VersionNames& names) {
   return "unidentified (best guess " + names.Of(Attribute(a, vocab::a_id), guess) + ")";
 }
 
+int64_t Number(const xml::Node& node, std::string_view name) {
+  std::string text = Attribute(node, name);
+  char* end = nullptr;
+  long long value = std::strtoll(text.c_str(), &end, 10);
+  return end != text.c_str() && *end == '\0' ? value : 0;
+}
+
+// Fills the parts of `finding` that `a` (an application of the merged user data) tells: the
+// verdict, the version or best guess, and the score of the version that decided it.
+void Describe(const xml::Node& a, const VersionNames& names, Finding& finding) {
+  finding.managed = Attribute(a, vocab::a_manage) == "1";
+  std::string id = Attribute(a, vocab::v_id);
+  // As the filter wrote them: "-1" with "Multiple Matches" or "Unsupported Version" when several
+  // versions were left.
+  finding.versionId = id;
+  finding.versionName = Attribute(a, vocab::v_name);
+  finding.versionSeq = Attribute(a, vocab::v_seq);
+  xml::Node decided;
+  if (id != kUnidentified && id != "0") {
+    finding.verdict = "identified";
+    for (xml::Node v : a.ChildElements(vocab::v)) {
+      if (Attribute(v, vocab::v_id) == id) decided = v;
+    }
+  } else {
+    finding.verdict = id == "0" ? "no match" : "unidentified";
+    for (xml::Node v : a.ChildElements(vocab::v)) {
+      if (finding.guessId.empty()) finding.guessId = Attribute(v, vocab::v_guess);
+    }
+    if (!finding.guessId.empty()) {
+      finding.guessName = names.Of(Attribute(a, vocab::a_id), finding.guessId);
+    }
+    // The version that came closest stands for the score: the guess when it is among them.
+    double best = -1;
+    for (xml::Node v : a.ChildElements(vocab::v)) {
+      double most = static_cast<double>(std::max<int64_t>(Number(v, vocab::v_max), 1));
+      double share = static_cast<double>(Number(v, vocab::v_act)) / most;
+      if (Attribute(v, vocab::v_id) == finding.guessId) share += 2;
+      if (share > best) best = share, decided = v;
+    }
+  }
+  if (!decided) return;
+  finding.score = Number(decided, vocab::v_act);
+  finding.maxScore = Number(decided, vocab::v_max);
+  finding.filesFound = Number(decided, vocab::f_act);
+  finding.filesExpected = Number(decided, vocab::f_max);
+  for (xml::Node f : decided.ChildElements(vocab::f)) {
+    finding.propertiesMatched |= static_cast<unsigned>(Number(f, vocab::p_act));
+  }
+}
+
 }  // namespace
 
 Inventory::Inventory(xml::Document& userData) : missing_(MissingCount(userData)) {
   ForEachApplication(userData, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
-    entries_.emplace(Key(c, m, d, a),
-                     Entry{Attribute(c, vocab::c_text),
-                           Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
-                                    Attribute(c, vocab::c_local) == "1"),
-                           Attribute(a, vocab::a_name), Attribute(a, vocab::v_id),
-                           Attribute(a, vocab::v_name), Attribute(a, vocab::a_id)});
+    entries_.emplace(
+        Key(c, m, d, a),
+        Entry{Attribute(c, vocab::c_text),
+              Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
+                       Attribute(c, vocab::c_local) == "1"),
+              Attribute(a, vocab::a_name), Attribute(a, vocab::v_id), Attribute(a, vocab::v_name),
+              Attribute(a, vocab::a_id), Attribute(c, vocab::c_local) == "1"});
   });
 }
 
@@ -121,11 +172,15 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
                     VersionText(a, names),
                     "",
                     Attribute(a, vocab::a_id)};
+    finding.local = Attribute(c, vocab::c_local) == "1";
+    Describe(a, names, finding);
     auto before = entries_.find(key);
     std::string id = Attribute(a, vocab::v_id);
     if (before == entries_.end()) {
-      finding.change = "new";
+      finding.changeKind = finding.change = "new";
     } else if (before->second.versionId != id) {
+      finding.changeKind = id == kUnidentified ? "no longer identified" : "updated";
+      finding.changedFrom = before->second.versionName;
       finding.change = (id == kUnidentified ? "no longer identified, was " : "updated from ") +
                        before->second.versionName;
     }
@@ -151,6 +206,7 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
   }
   for (Finding& finding : findings) {
     if (listed.count(finding.applicationId) == 0) continue;
+    finding.stillMissing = true;
     finding.change += finding.change.empty() ? "" : "; ";
     finding.change += "still on the missing list";
   }
@@ -159,8 +215,13 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     auto match = gone.find(entry.applicationId);
     if (match == gone.end()) continue;
     gone.erase(match);
-    findings.push_back(
-        Finding{entry.computer, entry.folder, entry.application, entry.versionName, "missing"});
+    Finding finding{entry.computer,    entry.folder, entry.application,
+                    entry.versionName, "missing",    entry.applicationId};
+    finding.verdict = finding.changeKind = "missing";
+    finding.versionId = entry.versionId;
+    finding.versionName = entry.versionName;
+    finding.local = entry.local;
+    findings.push_back(std::move(finding));
   }
 
   std::sort(findings.begin(), findings.end(), [](const Finding& x, const Finding& y) {
@@ -170,43 +231,38 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
   return findings;
 }
 
-std::string FindingsTable(const std::vector<Finding>& found) {
-  // What the documents and the disk hold may carry control characters: shown as escapes.
-  std::vector<Finding> findings;
-  for (const Finding& f : found) {
-    findings.push_back({Printable(f.computer), Printable(f.folder), Printable(f.application),
-                        Printable(f.version), Printable(f.change)});
-  }
-  const std::array<std::string, 5> heading{"COMPUTER", "FOLDER", "APPLICATION", "VERSION",
-                                           "CHANGE"};
-  std::array<size_t, 5> width{};
-  auto fields = [](const Finding& f) {
-    return std::array<const std::string*, 5>{&f.computer, &f.folder, &f.application, &f.version,
-                                             &f.change};
-  };
-  for (size_t i = 0; i < heading.size(); ++i) width[i] = heading[i].size();
-  for (const Finding& finding : findings) {
-    auto row = fields(finding);
-    for (size_t i = 0; i < row.size(); ++i) width[i] = std::max(width[i], row[i]->size());
-  }
+std::string ScoreText(const Finding& finding) {
+  if (finding.verdict == "missing" || finding.maxScore <= 0) return "-";
+  return fmt::format("{}%", 100 * std::max<int64_t>(finding.score, 0) / finding.maxScore);
+}
 
+std::string FindingsTable(const std::vector<Finding>& found) {
+  constexpr size_t kColumns = 6;
+  using Row = std::array<std::string, kColumns>;
+  // What the documents and the disk hold may carry control characters: shown as escapes.
+  std::vector<Row> rows{{"COMPUTER", "FOLDER", "APPLICATION", "VERSION", "SCORE", "CHANGE"}};
+  size_t changed = 0;
+  for (const Finding& f : found) {
+    rows.push_back({Printable(f.computer), Printable(f.folder), Printable(f.application),
+                    Printable(f.version), ScoreText(f), Printable(f.change)});
+    changed += !f.change.empty();
+  }
+  std::array<size_t, kColumns> width{};
+  for (const Row& row : rows) {
+    for (size_t i = 0; i < kColumns; ++i) width[i] = std::max(width[i], DisplayWidth(row[i]));
+  }
   std::string table;
-  auto line = [&](const std::array<const std::string*, 5>& row) {
+  for (const Row& row : rows) {
     std::string text;
-    for (size_t i = 0; i < row.size(); ++i) {
-      text += i + 1 < row.size() ? fmt::format("{:<{}}  ", *row[i], width[i]) : *row[i];
+    for (size_t i = 0; i < kColumns; ++i) {
+      text += row[i];
+      if (i + 1 < kColumns) text.append(width[i] - DisplayWidth(row[i]) + 2, ' ');
     }
     while (!text.empty() && text.back() == ' ') text.pop_back();
     table += text + "\n";
-  };
-  line({&heading[0], &heading[1], &heading[2], &heading[3], &heading[4]});
-  size_t changed = 0;
-  for (const Finding& finding : findings) {
-    line(fields(finding));
-    changed += !finding.change.empty();
   }
-  table += fmt::format("{} application{} listed, {} changed since the last run\n", findings.size(),
-                       findings.size() == 1 ? "" : "s", changed);
+  table += fmt::format("{} application{} listed, {} changed since the last run\n", found.size(),
+                       found.size() == 1 ? "" : "s", changed);
   return table;
 }
 

@@ -5,28 +5,31 @@
 
 #include "command_error.h"
 #include "document_files.h"
+#include "findings_output.h"
 #include "findings_table.h"
 
 namespace trl::cli {
 namespace {
 
 struct InventoryOptions {
-  std::string userData, fingerprint, format = "table";
+  std::string userData, fingerprint;
+  FindingsFormat shown{.format = "table"};
 };
 
 int ShowInventory(const InventoryOptions& options) {
   auto userData = LoadDocumentFile(options.userData, kUserDataRole);
-  if (options.format == "xml") {
+  if (options.shown.format == "xml") {
     WriteTextOutput(userData->Xml(), "");
     return kExitOk;
   }
   auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
   xml::Document none;
   // Nothing changed since the inventory was saved: each application as it stands.
-  std::string table =
-      FindingsTable(Inventory(*userData).Changes(*userData, fingerprint ? *fingerprint : none));
-  table.pop_back();
-  WriteTextOutput(table, "");
+  WriteTextOutput(
+      RenderFindings(options.shown,
+                     Inventory(*userData).Changes(*userData, fingerprint ? *fingerprint : none),
+                     nullptr),
+      "");
   return kExitOk;
 }
 
@@ -40,9 +43,7 @@ std::function<int()> AddInventoryCommand(CLI::App& app) {
       ->required();
   command->add_option("--fingerprint", options->fingerprint,
                       "Fingerprint database, to name the best guess of an unidentified version");
-  command->add_option("--format", options->format, "table: a summary; xml: the document itself")
-      ->check(CLI::IsMember({"xml", "table"}))
-      ->capture_default_str();
+  AddFindingsFormatOptions(*command, options->shown, "the document itself");
   return [command, options] { return command->parsed() ? ShowInventory(*options) : -1; };
 }
 

@@ -17,6 +17,7 @@
 #include "command_error.h"
 #include "document_files.h"
 #include "filter_names.h"
+#include "findings_output.h"
 #include "findings_table.h"
 #include "frame/vocabulary.h"
 #include "interrupt.h"
@@ -37,7 +38,7 @@ struct LocateOptions {
   std::vector<std::string> paths, excluded;
   std::string searchOptions, applicationOptions, fingerprint, userData, log;
   std::string filter = "all";
-  std::string format = "xml";
+  FindingsFormat shown;
   bool save = false;
   bool sync = false;
   StageOptions stage;
@@ -165,11 +166,6 @@ const char* StageName(int mode) {
   return mode >= 0 && mode <= Locate::kFinished ? names[mode] : "unknown";
 }
 
-std::string WithoutLastLineEnd(std::string text) {
-  if (!text.empty() && text.back() == '\n') text.pop_back();
-  return text;
-}
-
 int RunLocate(const LocateOptions& options) {
   if (options.save && options.userData.empty()) {
     throw CommandError("--save needs the user data to save: give --user-data FILE");
@@ -191,7 +187,7 @@ int RunLocate(const LocateOptions& options) {
     ::close(fd);
   }
   std::unique_ptr<Inventory> before;
-  if (options.format == "table") {
+  if (options.shown.format != "xml") {
     xml::Document empty;
     before = std::make_unique<Inventory>(documents.userData ? *documents.userData : empty);
   }
@@ -219,7 +215,8 @@ int RunLocate(const LocateOptions& options) {
 
   if (outcome.cancelled) {
     std::string wrote = "nothing was written";
-    if (!outcome.results.empty() && (!options.stage.output.empty() || options.format == "xml")) {
+    if (!outcome.results.empty() &&
+        (!options.stage.output.empty() || options.shown.format == "xml")) {
       WriteTextOutput(outcome.results, options.stage.output);
       wrote = fmt::format(
           "what the {} stage had was written to {}", StageName(outcome.stage),
@@ -238,12 +235,14 @@ int RunLocate(const LocateOptions& options) {
     ReplaceFileAtomically(options.userData, documents.userData->Xml(), {.keepBackup = true});
   int status = printer.Failures() > 0 ? kExitFailuresReported : kExitOk;
   try {
-    if (options.format == "table") {
+    if (options.shown.format != "xml") {
       xml::Document none;
       xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
-      WriteTextOutput(
-          WithoutLastLineEnd(FindingsTable(before->Changes(*documents.userData, fingerprint))),
-          options.stage.output);
+      xml::Document results;
+      results.LoadXml(outcome.results);
+      WriteTextOutput(RenderFindings(options.shown,
+                                     before->Changes(*documents.userData, fingerprint), &results),
+                      options.stage.output);
     } else {
       WriteTextOutput(outcome.results, options.stage.output);
     }
@@ -288,9 +287,7 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
   command->add_flag("--save", options->save,
                     "After a complete run, replace the --user-data file with the merged user data "
                     "(atomically; the previous one is kept as FILE.bak)");
-  command->add_option("--format", options->format, "xml: the merged results; table: a summary")
-      ->check(CLI::IsMember({"xml", "table"}))
-      ->capture_default_str();
+  AddFindingsFormatOptions(*command, options->shown, "the merged results");
   command->add_flag("--sync", options->sync,
                     "Run each stage straight through (no live progress; Ctrl-C ends the process)");
   command->footer(

@@ -1,6 +1,7 @@
 #include "terminal_text.h"
 
 #include <fmt/format.h>
+#include <utf8proc.h>
 
 #include "platform/text.h"
 
@@ -40,6 +41,22 @@ std::string Printable(std::string_view text) {
     i += length;
   }
   return out;
+}
+
+size_t DisplayWidth(std::string_view text) {
+  size_t width = 0;
+  for (size_t i = 0; i < text.size();) {
+    utf8proc_int32_t codePoint = 0;
+    auto length = utf8proc_iterate(reinterpret_cast<const utf8proc_uint8_t*>(text.data() + i),
+                                   static_cast<utf8proc_ssize_t>(text.size() - i), &codePoint);
+    if (length <= 0) {
+      ++width, ++i;
+      continue;
+    }
+    width += static_cast<size_t>(std::max(utf8proc_charwidth(codePoint), 0));
+    i += static_cast<size_t>(length);
+  }
+  return width;
 }
 
 }  // namespace trl::cli

@@ -10,4 +10,8 @@ namespace trl::cli {
 // sent to the terminal.
 std::string Printable(std::string_view text);
 
+// How many terminal columns printable UTF-8 text takes: wide characters take two, combining
+// marks none.
+size_t DisplayWidth(std::string_view text);
+
 }  // namespace trl::cli

@@ -271,13 +271,13 @@ TEST_F(DocumentFilesTest, AnApplicationSavedFromFoldersIsReportedMissingOnceGone
       "locate @tree --fingerprint @fp.xml --user-data @user.xml --save --sync "
       "--format table --output @table.txt";
   ASSERT_EQ(Run(run).first, kExitOk);
-  EXPECT_NE(Read("table.txt").find("Tool         1        new"), std::string::npos);
+  EXPECT_NE(Read("table.txt").find("Tool         1        100%   new"), std::string::npos);
   std::string saved = Read("user.xml");
   EXPECT_EQ(Run("manage --user-data @user.xml @nowhere").first, kExitBadInput);
   EXPECT_EQ(Read("user.xml"), saved);
   std::filesystem::remove_all(tree_.Native("tree/app"));
   ASSERT_EQ(Run(run).first, kExitOk);
-  EXPECT_NE(Read("table.txt").find("Tool         1        missing"), std::string::npos)
+  EXPECT_NE(Read("table.txt").find("Tool         1        -      missing"), std::string::npos)
       << Read("table.txt");
   tree_.AddFolder("tree/app");
   tree_.AddFile("tree/app/tool.exe", "x");

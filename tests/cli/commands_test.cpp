@@ -242,12 +242,12 @@ TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
 
 TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
   ASSERT_EQ(Locate("--save --format table --output @first.txt"), kExitOk);
-  EXPECT_THAT(Read("first.txt"), ::testing::ContainsRegex("Tool +1\\.0 +new\n"));
+  EXPECT_THAT(Read("first.txt"), ::testing::ContainsRegex("Tool +1\\.0 +100% +new\n"));
 
   tree_.AddFile("App/tool.exe", "three");
   ASSERT_EQ(Locate("--save --format table --output @second.txt"), kExitOk);
   std::string second = Read("second.txt");
-  EXPECT_THAT(second, ::testing::ContainsRegex("Tool +2\\.0 +updated from 1\\.0\n"));
+  EXPECT_THAT(second, ::testing::ContainsRegex("Tool +2\\.0 +100% +updated from 1\\.0\n"));
   EXPECT_THAT(second, ::testing::HasSubstr("1 application listed, 1 changed since the last run"));
 }
 
