@@ -18,6 +18,9 @@ packages=(
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev nlohmann-json3-dev
   libgtest-dev libgmock-dev libbenchmark-dev
 )
+# The CycloneDX schema the tests validate against comes from npm.
+packages+=(python3-jsonschema)
+command -v npm >/dev/null || packages+=(npm)
 if ((example)); then
   packages+=(node-semver node-graceful-fs node-which node-nopt)
 fi
@@ -47,4 +50,15 @@ fi
 if ! log=$(cmake --build "$build_dir" -- --quiet 2>&1); then
   printf '%s\n' "$log" >&2
   exit 1
+fi
+
+# The published CycloneDX 1.6 JSON schema, for the test that validates the bill of materials.
+schema_dir="$build_dir/cyclonedx-schema"
+if [ ! -f "$schema_dir/bom-1.6.SNAPSHOT.schema.json" ]; then
+  fetch="$(mktemp -d)"
+  (cd "$fetch" && npm pack --silent @cyclonedx/cyclonedx-library@10.3.0 >/dev/null &&
+    tar xzf cyclonedx-cyclonedx-library-10.3.0.tgz package/res/schema)
+  mkdir -p "$schema_dir"
+  cp "$fetch"/package/res/schema/*.schema.json "$schema_dir"/
+  rm -rf "$fetch"
 fi

@@ -61,14 +61,33 @@ size_t MissingCount(xml::Document& document) {
   return count;
 }
 
-// Version names of the fingerprint by application and version id, for naming best guesses.
+int64_t Number(const xml::Node& node, std::string_view name) {
+  std::string text = Attribute(node, name);
+  char* end = nullptr;
+  long long value = std::strtoll(text.c_str(), &end, 10);
+  return end != text.c_str() && *end == '\0' ? value : 0;
+}
+
+// What the fingerprint tells of the versions: their names, for naming best guesses, and the
+// types of each file's properties by the bit of its weight, for telling which kinds of evidence
+// agreed.
 class VersionNames {
  public:
   explicit VersionNames(xml::Document& fingerprint) {
     for (xml::Node a : fingerprint.AsNode().GetElementsByTagName(vocab::a)) {
       std::string application = Attribute(a, vocab::a_id);
       for (xml::Node v : a.ChildElements(vocab::v)) {
-        names_.emplace(application + "\n" + Attribute(v, vocab::v_id), Attribute(v, vocab::v_name));
+        std::string version = application + "\n" + Attribute(v, vocab::v_id);
+        names_.emplace(version, Attribute(v, vocab::v_name));
+        for (xml::Node f : v.ChildElements(vocab::f)) {
+          auto& types = types_[version + "\n" + Attribute(f, vocab::f_id)];
+          for (xml::Node p : f.ChildElements(vocab::p)) {
+            int64_t weight = Number(p, vocab::p_weight), type = Number(p, vocab::p_type);
+            if (weight >= 1 && weight <= 15 && type >= 1 && type <= 4) {
+              types.emplace_back(unsigned{1} << (weight - 1), unsigned{1} << (type - 1));
+            }
+          }
+        }
       }
     }
   }
@@ -76,9 +95,18 @@ class VersionNames {
     auto found = names_.find(application + "\n" + version);
     return found != names_.end() ? found->second : "version id " + version;
   }
+  // The property types (bit 1 for type 1, up to bit 8 for type 4) whose weight bits `mask` holds.
+  unsigned TypesAgreed(const std::string& file, unsigned mask) const {
+    auto found = types_.find(file);
+    unsigned agreed = 0;
+    if (found == types_.end()) return agreed;
+    for (const auto& [bit, type] : found->second) agreed |= (mask & bit) != 0 ? type : 0;
+    return agreed;
+  }
 
  private:
   std::unordered_map<std::string, std::string> names_;
+  std::unordered_map<std::string, std::vector<std::pair<unsigned, unsigned>>> types_;
 };
 
 std::string VersionText(const xml::Node& a, const VersionNames& names) {
@@ -92,13 +120,6 @@ std::string VersionText(const xml::Node& a, const VersionNames& names) {
   }
   if (guess.empty()) return "unidentified";
   return "unidentified (best guess " + names.Of(Attribute(a, vocab::a_id), guess) + ")";
-}
-
-int64_t Number(const xml::Node& node, std::string_view name) {
-  std::string text = Attribute(node, name);
-  char* end = nullptr;
-  long long value = std::strtoll(text.c_str(), &end, 10);
-  return end != text.c_str() && *end == '\0' ? value : 0;
 }
 
 // Fills the parts of `finding` that `a` (an application of the merged user data) tells: the
@@ -139,8 +160,13 @@ void Describe(const xml::Node& a, const VersionNames& names, Finding& finding) {
   finding.maxScore = Number(decided, vocab::v_max);
   finding.filesFound = Number(decided, vocab::f_act);
   finding.filesExpected = Number(decided, vocab::f_max);
+  // A relabelled version keeps its own id as its guess.
+  std::string versionId = Attribute(decided, vocab::v_id);
+  if (versionId == kUnidentified) versionId = Attribute(decided, vocab::v_guess);
+  std::string version = Attribute(a, vocab::a_id) + "\n" + versionId + "\n";
   for (xml::Node f : decided.ChildElements(vocab::f)) {
-    finding.propertiesMatched |= static_cast<unsigned>(Number(f, vocab::p_act));
+    finding.propertiesMatched |= names.TypesAgreed(version + Attribute(f, vocab::f_id),
+                                                   static_cast<unsigned>(Number(f, vocab::p_act)));
   }
 }
 
