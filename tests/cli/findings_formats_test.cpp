@@ -4,6 +4,7 @@
 
 #include "cyclonedx_bom.h"
 #include "findings_json.h"
+#include "findings_output.h"
 #include "findings_table.h"
 #include "support/documents.h"
 
@@ -100,6 +101,10 @@ TEST_F(FindingsFormatsTest, BomAndTableShowHowSureTheVerdictIs) {
   EXPECT_EQ(bom["components"][1]["version"], "2.1");
   EXPECT_DOUBLE_EQ(bom["components"][1]["evidence"]["identity"][0]["confidence"], 0.5);
 
+  // Below 70%: One goes; the missing, which have no score, stay.
+  std::string strong = RenderFindings({.format = "table", .minScore = 70}, findings_, nullptr);
+  EXPECT_EQ(strong.find("One"), std::string::npos);
+  EXPECT_NE(strong.find("Gone"), std::string::npos);
   std::string table = FindingsTable(findings_);
   EXPECT_NE(table.find("pc        C:/one/   One          1.1" + std::string(28, ' ') +
                        "66%    updated from 1.0\n"),
