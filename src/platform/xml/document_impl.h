@@ -41,7 +41,7 @@ struct Document::Impl {
 
   // Empties the document, dropping every index and detached node.
   void Reset(ParseError error);
-  bool Load(const char* data, size_t size, pugi::xml_encoding encoding);
+  bool Load(std::string_view text, const Limits& limits);
 
   // The holder, created when missing.
   pugi::xml_node Holder();
