@@ -48,6 +48,7 @@ void Document::Impl::Reset(ParseError error) {
   attributePrototypes.clear();
   recentPrototypes = {};
   doc.reset();
+  descendants.Reset(0);
   parseError = std::move(error);
   Changed();
 }
@@ -76,6 +77,7 @@ bool Document::Impl::Load(std::string_view text, const Limits& limits) {
     Reset(ErrorAt(text, check.fault->offset, check.fault->reason));
     return false;
   }
+  descendants.Reset(check.elements);
   return true;
 }
 
@@ -189,7 +191,7 @@ pugi::xml_node Document::Impl::Place(pugi::xml_node parent, const Node& child,
     parent.remove_child(replacing);
   }
   index.ChildArrived(parent, placed);
-  Changed();
+  TreeChanged();
   return placed;
 }
 
@@ -217,7 +219,7 @@ pugi::xml_node Document::Impl::AppendElement(
     throw;
   }
   index.ChildArrived(parent, element);
-  Changed();
+  TreeChanged();
   return element;
 }
 
@@ -226,7 +228,7 @@ void Document::Impl::Destroy(pugi::xml_node node) {
   index.ChildLeaving(parent, node);
   index.SubtreeDestroying(node);
   parent.remove_child(node);
-  Changed();
+  TreeChanged();
 }
 
 Document::Document() : impl_(std::make_unique<Impl>(*this)) {}

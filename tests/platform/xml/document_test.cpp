@@ -307,6 +307,33 @@ TEST(XmlDocumentTest, ChildrenNamesAndText) {
   EXPECT_EQ(doc.Xml(), "<r/>");
 }
 
+// In a chain of nested elements, each asked for the elements below it, every level gets what a
+// walk of its subtree gives, in one walk of the chain rather than one per level (the test's time
+// limit sees the difference), also once the tree changes.
+TEST(XmlDocumentTest, FindsElementsBelowEachLevelOfADeepChain) {
+  constexpr int kDepth = 100000;
+  Document doc;
+  std::vector<Node> chain{doc.SetDocumentElement(doc.CreateElement("x"))};
+  Node middle;
+  for (int level = 1; level < kDepth; ++level) {
+    if (level == kDepth / 2) middle = chain.back().AppendElement("y", {});
+    chain.push_back(chain.back().AppendElement("x", {}));
+  }
+  Node bottom = chain.back().AppendElement("y", {});
+  const std::vector<Node> both{middle, bottom};
+  for (int level = 0; level < kDepth; ++level) {
+    ASSERT_EQ(chain[level].GetElementsByTagName("y"),
+              level < kDepth / 2 ? both : std::vector<Node>{bottom})
+        << level;
+  }
+  EXPECT_EQ(chain[kDepth - 2].GetElementsByTagName("*"), (std::vector<Node>{chain.back(), bottom}));
+  EXPECT_EQ(doc.AsNode().GetElementsByTagName("y"), both);
+  chain.back().RemoveChild(bottom);
+  EXPECT_EQ(chain[1].GetElementsByTagName("y"), std::vector<Node>{middle});
+  bottom = chain[kDepth - 2].AppendElement("y", {});
+  EXPECT_EQ(chain[1].GetElementsByTagName("y"), (std::vector<Node>{middle, bottom}));
+}
+
 // Pieces of all lengths, across the end of the start and the ends of blocks, come out whole and
 // in order; a builder is empty once its text is taken.
 TEST(TextBuilderTest, HandsOverEveryPieceInOrder) {
