@@ -8,7 +8,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
 #include <fstream>
 #include <memory>
 
@@ -25,28 +24,32 @@ std::string SystemReason(int error) { return std::strerror(error); }
 
 xml::DocumentPtr LoadDocumentFile(const std::string& path, const DocumentRole& documentRole) {
   std::string_view role = documentRole.name;
-  // Opened here first, so that a missing or unreadable file gets the system's own reason.
-  std::error_code ignored;
-  if (std::filesystem::is_directory(path, ignored)) {
-    throw CommandError(
-        fmt::format("cannot read the {} '{}': {}", role, path, SystemReason(EISDIR)));
+  auto unreadable = [&](std::string_view reason) {
+    return CommandError(fmt::format("cannot read the {} '{}': {}", role, path, reason));
+  };
+  // Looked at here first, so that a missing or unreadable file gets the system's own reason.
+  struct stat status {};
+  if (::stat(path.c_str(), &status) != 0) throw unreadable(SystemReason(errno));
+  if (S_ISDIR(status.st_mode)) throw unreadable(SystemReason(EISDIR));
+  // A device is no document, and may never end (/dev/zero).
+  if (S_ISCHR(status.st_mode) || S_ISBLK(status.st_mode)) {
+    throw unreadable("it is a device, not a file");
   }
-  std::ifstream probe(path, std::ios::binary);
-  if (!probe) {
-    throw CommandError(fmt::format("cannot read the {} '{}': {}", role, path, SystemReason(errno)));
+  // A pipe is read once, by the load: a look ahead would take its first bytes away.
+  if (S_ISREG(status.st_mode)) {
+    std::ifstream probe(path, std::ios::binary);
+    if (!probe) throw unreadable(SystemReason(errno));
+    if (probe.peek() == std::ifstream::traits_type::eof()) {
+      throw CommandError(fmt::format("the {} '{}' is empty", role, path));
+    }
   }
-  if (probe.peek() == std::ifstream::traits_type::eof()) {
-    throw CommandError(fmt::format("the {} '{}' is empty", role, path));
-  }
-  probe.close();
   auto document = std::make_shared<xml::Document>();
   if (!document->Load(path)) {
     const xml::ParseError& error = document->LastParseError();
-    if (error.line == 0) {
-      throw CommandError(fmt::format("cannot read the {} '{}': {}", role, path, error.reason));
-    }
-    throw CommandError(fmt::format("the {} '{}' is not well-formed XML: line {}, column {}: {}",
-                                   role, path, error.line, error.column, error.reason));
+    if (error.line == 0) throw unreadable(error.reason);
+    throw CommandError(fmt::format("the {} '{}' {}: line {}, column {}: {}", role, path,
+                                   error.limit ? "is over a limit" : "is not well-formed XML",
+                                   error.line, error.column, error.reason));
   }
   if (!document->DocumentElement()) {
     throw CommandError(fmt::format("the {} '{}' holds no XML element", role, path));
@@ -64,12 +67,12 @@ void WriteTextOutput(const std::string& text, const std::string& path) {
   bool stream = path.empty() || (::lstat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode) &&
                                  !S_ISDIR(status.st_mode));
   if (!stream) {
-    // A file is never truncated before its new text is complete, and a link planted in its place
-    // is replaced rather than written through.
+    // A file is never truncated before its new text is complete.
     ReplaceFileAtomically(path, text, {.keepBackup = false, .throughLink = false});
     return;
   }
-  // A terminal, a pipe, a device, or a link to one of them (/dev/stdout).
+  // A terminal, a pipe, a device, or a link to one of them (/dev/stdout); a link to a file is
+  // refused.
   int fd = path.empty() ? ::dup(STDOUT_FILENO) : fs::OpenForWriting(path, 0);
   if (fd < 0) {
     throw CommandError(

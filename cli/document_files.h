@@ -9,8 +9,8 @@
 namespace trl::cli {
 
 // Loads the XML document at `path` for `role`, which names it in messages. A file that is missing,
-// unreadable or empty, not well-formed XML (with line and column), or of a kind the role does not
-// accept is a CommandError.
+// unreadable, empty or a device, not well-formed XML or over a limit of the document layer (with
+// line and column where there are), or of a kind the role does not accept is a CommandError.
 xml::DocumentPtr LoadDocumentFile(const std::string& path, const DocumentRole& role);
 // The same, or null when `path` is empty (the option was not given).
 xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const DocumentRole& role);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <initializer_list>
 #include <memory>
@@ -95,8 +96,21 @@ class Node {
 struct ParseError {
   bool ok = true;
   std::string reason;
-  int64_t line = 0;    // 1-based
-  int64_t column = 0;  // 1-based, in bytes
+  // 1-based; both 0 when the failure has no place in the text (a file that cannot be read, a
+  // document larger than its limit).
+  int64_t line = 0;
+  int64_t column = 0;  // in bytes of the text as UTF-8
+  // The document breaks one of the Limits, not a rule of XML; the reason names the limit.
+  bool limit = false;
+};
+
+// The most a load accepts. The defaults are far beyond any real document (the largest a run of the
+// component makes is a few hundred megabytes, nested eight deep), so that a document made to
+// exhaust memory or time is refused before it is parsed.
+struct Limits {
+  size_t bytes = size_t{2} << 30;  // the text, as UTF-8
+  size_t depth = 256;              // elements nested in one another
+  size_t elements = 50'000'000;
 };
 
 // An XML document: the tree the component reads and writes, with XPath 1.0 selections, raw
@@ -109,9 +123,14 @@ class Document {
   Document& operator=(const Document&) = delete;
 
   // Replace the content with the parsed text or file. On failure the document is left empty and
-  // LastParseError tells where and why.
-  bool LoadXml(std::string_view text);
-  bool Load(const std::string& path);
+  // LastParseError tells where and why. A document loads only when it is well formed in what the
+  // parser behind it lets pass too: every character, raw or as a character reference, one that
+  // XML 1.0 allows, the text valid UTF-8, no attribute given twice on one element, no "<" in an
+  // attribute value; and when it keeps within `limits`. A file is read as its byte order mark,
+  // its UTF-16 or UTF-32 spelling of "<?xml" or its declared encoding says, else as UTF-8; text
+  // in memory is UTF-8 whatever it declares.
+  bool LoadXml(std::string_view text, const Limits& limits = Limits());
+  bool Load(const std::string& path, const Limits& limits = Limits());
   const ParseError& LastParseError() const;
 
   // The whole document, raw, without declaration; "" when it has no content.

@@ -37,12 +37,6 @@ size_t AsciiPrefix(std::string_view text, Keep keep) {
   return i;
 }
 
-bool IsXmlChar(char32_t cp) {
-  if (cp < 0x20) return cp == 0x09 || cp == 0x0A || cp == 0x0D;
-  if (cp >= 0xD800 && cp <= 0xDFFF) return false;
-  return cp != 0xFFFE && cp != 0xFFFF && cp <= 0x10FFFF;
-}
-
 // Characters a name cannot carry as they are: those XML cannot hold, all control characters (an
 // attribute value does not keep them through a reload), the component's path separator, and the
 // escape block itself.
@@ -52,6 +46,12 @@ bool NeedsEscape(char32_t cp) {
 }
 
 }  // namespace
+
+bool IsXmlChar(char32_t cp) {
+  if (cp < 0x20) return cp == 0x09 || cp == 0x0A || cp == 0x0D;
+  if (cp >= 0xD800 && cp <= 0xDFFF) return false;
+  return cp != 0xFFFE && cp != 0xFFFF && cp <= 0x10FFFF;
+}
 
 std::string LowerCase(std::string_view text) {
   // Names are mostly ASCII: that part is copied and lowered in place, without a test per append.

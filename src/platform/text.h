@@ -21,6 +21,9 @@ inline bool TerminatedEquals(const char* text, std::string_view view) {
   return *text == '\0';
 }
 
+// Whether `cp` is a character an XML 1.0 document may hold (the Char production).
+bool IsXmlChar(char32_t cp);
+
 // True when every character of valid UTF-8 `text` may stand in an XML 1.0 document.
 bool IsXmlSafe(std::string_view text);
 

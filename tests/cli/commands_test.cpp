@@ -167,6 +167,9 @@ TEST_F(CommandsTest, EachStageCommandWritesItsDocumentAndPrintsWhatTheStageRepor
 
 TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
   tree_.AddFile("broken.xml", "<a>\n  <b></a>");
+  std::string deep;
+  for (int i = 0; i < 257; ++i) deep += "<a>";
+  tree_.AddFile("deep.xml", deep);
   const std::string add = "fingerprint add --app-id 1 --version-name v --seq 1 --folder ";
   // A command line, its exit code and how its message begins.
   const std::tuple<std::string, int, std::string> cases[] = {
@@ -185,6 +188,12 @@ TEST_F(CommandsTest, BadRequestsAreRefusedSayingWhatIsWrongAndWriteNothing) {
       {"merge --search-options @managed.xml --user-data @user.xml --new-results @none.xml",
        kExitBadInput, "cannot read the new results '@none.xml'"},
       {"filter --filter 64 --matches @matches.xml", kExitBadInput, "--filter '64' is not a filter"},
+      {"filter --filter 1 --matches /dev/zero", kExitBadInput,
+       "cannot read the results document '/dev/zero': it is a device, not a file"},
+      {"filter --filter 1 --matches @deep.xml", kExitBadInput,
+       "the results document '@deep.xml' is over a limit: line 1, column 769: the elements are "
+       "nested "
+       "more than 256 deep"},
       {"locate --search-options @search.xml --save --output @out.xml", kExitBadInput,
        "--save needs the user data"},
       {"locate --search-options @search.xml --filter low-weights,bogus --output @out.xml",

@@ -2,12 +2,12 @@
 
 #include <algorithm>
 #include <atomic>
-#include <fstream>
-#include <sstream>
 
 #include "platform/failure.h"
 #include "platform/text.h"
 #include "platform/xml/document_impl.h"
+#include "platform/xml/file_text.h"
+#include "platform/xml/load_check.h"
 #include "platform/xml/name.h"
 
 namespace trl::xml {
@@ -18,14 +18,6 @@ namespace {
 constexpr unsigned kParseOptions = pugi::parse_default | pugi::parse_comments | pugi::parse_pi;
 
 std::atomic<uint64_t> lastSerial{0};
-
-ParseError ErrorAt(const pugi::xml_parse_result& result, std::string_view text) {
-  auto before = text.substr(0, static_cast<size_t>(result.offset));
-  auto lineStart = before.rfind('\n');
-  auto column = lineStart == std::string_view::npos ? before.size() : before.size() - lineStart - 1;
-  return {false, result.description(), std::count(before.begin(), before.end(), '\n') + 1,
-          static_cast<int64_t>(column) + 1};
-}
 
 }  // namespace
 
@@ -56,17 +48,37 @@ void Document::Impl::Reset(ParseError error) {
   attributePrototypes.clear();
   recentPrototypes = {};
   doc.reset();
+  descendants.Reset(0);
   parseError = std::move(error);
   Changed();
 }
 
-bool Document::Impl::Load(const char* data, size_t size, pugi::xml_encoding encoding) {
+bool Document::Impl::Load(std::string_view text, const Limits& limits) {
   Reset(ParseError{});
-  pugi::xml_parse_result result = doc.load_buffer(data, size, kParseOptions, encoding);
-  if (result) return true;
-  // pugixml keeps what it parsed before the error.
-  Reset(ErrorAt(result, std::string_view(data, size)));
-  return false;
+  if (text.size() > limits.bytes) {
+    Reset(TooLarge(limits.bytes));
+    return false;
+  }
+  TextCheck check = CheckDocumentText(text, limits);
+  if (check.overLimit) {
+    ParseError error = ErrorAt(text, check.fault->offset, check.fault->reason);
+    error.limit = check.fault->limit;
+    Reset(std::move(error));
+    return false;
+  }
+  pugi::xml_parse_result result =
+      doc.load_buffer(text.data(), text.size(), kParseOptions, pugi::encoding_utf8);
+  // Of a fault of the parser's and one of the check's, the first in the text is told.
+  if (!result && (!check.fault || static_cast<size_t>(result.offset) < check.fault->offset)) {
+    Reset(ErrorAt(text, static_cast<size_t>(result.offset), result.description()));
+    return false;
+  }
+  if (check.fault) {
+    Reset(ErrorAt(text, check.fault->offset, check.fault->reason));
+    return false;
+  }
+  descendants.Reset(check.elements);
+  return true;
 }
 
 pugi::xml_node Document::Impl::Holder() {
@@ -179,7 +191,7 @@ pugi::xml_node Document::Impl::Place(pugi::xml_node parent, const Node& child,
     parent.remove_child(replacing);
   }
   index.ChildArrived(parent, placed);
-  Changed();
+  TreeChanged();
   return placed;
 }
 
@@ -207,7 +219,7 @@ pugi::xml_node Document::Impl::AppendElement(
     throw;
   }
   index.ChildArrived(parent, element);
-  Changed();
+  TreeChanged();
   return element;
 }
 
@@ -216,29 +228,24 @@ void Document::Impl::Destroy(pugi::xml_node node) {
   index.ChildLeaving(parent, node);
   index.SubtreeDestroying(node);
   parent.remove_child(node);
-  Changed();
+  TreeChanged();
 }
 
 Document::Document() : impl_(std::make_unique<Impl>(*this)) {}
 
 Document::~Document() = default;
 
-bool Document::LoadXml(std::string_view text) {
-  return impl_->Load(text.data(), text.size(), pugi::encoding_utf8);
+bool Document::LoadXml(std::string_view text, const Limits& limits) {
+  return impl_->Load(text, limits);
 }
 
-bool Document::Load(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in) {
-    pugi::xml_parse_result missing;
-    missing.status = pugi::status_file_not_found;
-    impl_->Reset(ParseError{false, missing.description(), 0, 0});
+bool Document::Load(const std::string& path, const Limits& limits) {
+  FileText file = ReadXmlFile(path, limits.bytes);
+  if (file.error) {
+    impl_->Reset(std::move(*file.error));
     return false;
   }
-  std::ostringstream text;
-  text << in.rdbuf();
-  std::string content = std::move(text).str();
-  return impl_->Load(content.data(), content.size(), pugi::encoding_auto);
+  return impl_->Load(file.text, limits);
 }
 
 const ParseError& Document::LastParseError() const { return impl_->parseError; }

@@ -8,6 +8,7 @@
 #include <unordered_map>
 
 #include "platform/xml/child_index.h"
+#include "platform/xml/descendant_index.h"
 #include "trl/xml.h"
 
 namespace trl::xml {
@@ -41,7 +42,7 @@ struct Document::Impl {
 
   // Empties the document, dropping every index and detached node.
   void Reset(ParseError error);
-  bool Load(const char* data, size_t size, pugi::xml_encoding encoding);
+  bool Load(std::string_view text, const Limits& limits);
 
   // The holder, created when missing.
   pugi::xml_node Holder();
@@ -71,6 +72,11 @@ struct Document::Impl {
   // Removes `node` from its parent and frees it with everything below.
   void Destroy(pugi::xml_node node);
   void Changed() { ++modifications; }
+  // An element of the tree came or went (or may have).
+  void TreeChanged() {
+    descendants.Drop();
+    Changed();
+  }
 
   Document& owner;
   pugi::xml_document doc;
@@ -79,6 +85,7 @@ struct Document::Impl {
   uint64_t modifications = 0;
   uint64_t serial;
   ChildIndex index;
+  DescendantIndex descendants;
 
  private:
   // The name pool: the holder's first child, unnamed, so no selection can name it. It holds one

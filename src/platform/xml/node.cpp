@@ -278,7 +278,7 @@ void Node::SetText(std::string_view text) {
   } else if (!node.set_value(text.data(), text.size())) {
     FailOutOfMemory();
   }
-  impl.Changed();
+  impl.TreeChanged();
 }
 
 std::string Node::Xml() const {

@@ -58,13 +58,21 @@ std::vector<Node> Node::GetElementsByTagName(std::string_view tag) const {
   pugi::xml_node node = Require(*this);
   Document::Impl& impl = *document_->impl_;
   std::vector<Node> found;
+  if (auto below = impl.descendants.Below(node, tag)) {
+    found.reserve(below->size());
+    for (uint32_t position : *below) found.push_back(impl.Wrap(impl.descendants.At(position)));
+    return found;
+  }
+  size_t visited = 0;
   // The holder is the document's last child, so meeting it ends the tree.
   for (pugi::xml_node at = NextInSubtree(node, node); at && at != impl.holder;
        at = NextInSubtree(at, node)) {
+    ++visited;
     if (at.type() == pugi::node_element && (tag == "*" || TerminatedEquals(at.name(), tag))) {
       found.push_back(impl.Wrap(at));
     }
   }
+  impl.descendants.Walked(node, visited, impl.doc, impl.holder);
   return found;
 }
 

@@ -1,10 +1,12 @@
 #include "platform/fs/posix/posix_file_system.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <functional>
 #include <tuple>
 
 #include "platform/failure.h"
@@ -83,6 +85,40 @@ TEST_F(PosixFileSystemTest, ListsSkippingFolderLinksAndDanglingLinks) {
   EXPECT_THAT(NamesOf(folder->SubFolders()), UnorderedElementsAre("sub", "other"));
   for (const auto& file : folder->Files())
     EXPECT_EQ(file->Path(), tree_.Path("list/" + file->Name()));
+}
+
+// Folders below a path longer than the system takes at once are listed, and their files looked
+// up, read and their attributes read, like any others.
+TEST_F(PosixFileSystemTest, ReachesItemsBelowPathsLongerThanPathMax) {
+  const std::string name(200, 'd');
+  constexpr int kDepth = 40;  // 40 folders of 201 bytes each: twice PATH_MAX
+  int folder = ::open(tree_.Root().c_str(), O_RDONLY | O_DIRECTORY);
+  std::string path = tree_.Path();
+  for (int level = 0; level < kDepth; ++level) {
+    ASSERT_EQ(::mkdirat(folder, name.c_str(), 0755), 0);
+    int below = ::openat(folder, name.c_str(), O_RDONLY | O_DIRECTORY);
+    ::close(folder);
+    folder = below;
+    int file = ::openat(folder, "f", O_CREAT | O_WRONLY, 0644);
+    std::string level_text = std::to_string(level);
+    ASSERT_EQ(::write(file, level_text.data(), level_text.size()), level_text.size());
+    ::close(file);
+    path += "\\" + name;
+  }
+  ::close(folder);
+  std::vector<std::string> read;
+  std::vector<std::string> expected;
+  std::function<void(Folder&)> walk = [&](Folder& at) {
+    for (const auto& file : at.Files()) {
+      read.push_back(ReadAll(*file) + (file->Attributes() == 0 ? "" : " with attributes"));
+    }
+    for (const auto& sub : at.SubFolders()) walk(*sub);
+  };
+  walk(*fs_->GetFolder(tree_.Path()));
+  for (int level = 0; level < kDepth; ++level) expected.push_back(std::to_string(level));
+  EXPECT_EQ(read, expected);
+  EXPECT_TRUE(fs_->FolderExists(path));
+  EXPECT_EQ(ReadAll(*fs_->GetFile(path + "\\f")), std::to_string(kDepth - 1));
 }
 
 // What a path names decides what the lookups answer: whether a file or a folder exists, and the

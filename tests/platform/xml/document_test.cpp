@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "platform/failure.h"
@@ -76,6 +77,86 @@ TEST(XmlDocumentTest, LoadsAndWrites) {
     EXPECT_EQ(std::pair(error.line, error.column), where) << error.reason;
     EXPECT_EQ(doc.Xml(), "");
   }
+}
+
+// What the parser lets pass is refused as XML refuses it, raw or as a character reference, in
+// text, attribute values and markup alike, at the first fault in the text, the parser's or not.
+// What XML allows in those places loads, and writes a text that loads again.
+TEST(XmlDocumentTest, LoadsOnlyWellFormedText) {
+  std::string many = "<r";
+  for (int i = 0; i < 20; ++i) many += " a" + std::to_string(i) + "='1'";
+  const std::tuple<std::string, int64_t, int64_t> refused[] = {
+      {"<r>\x01</r>", 1, 4},
+      {"<r>\n &#1;</r>", 2, 2},
+      {"<r a='&#x110000;'/>", 1, 7},
+      {"<r>&#xD800;</r>", 1, 4},
+      {"<r>&#;</r>", 1, 4},
+      {"<r>&#12a;</r>", 1, 4},
+      {"<r>\xC3</r>", 1, 4},
+      {"<r>\xEF\xBF\xBE</r>", 1, 4},
+      {"<r><!-- \x02 --></r>", 1, 9},
+      {"<r a='1' b='2' a='3'/>", 1, 16},
+      {many + " a3='2'/>", 1, static_cast<int64_t>(many.size()) + 2},
+      {"<r a='<'/>", 1, 7},
+      {"<r>&#1;<a></b></r>", 1, 4},
+      {"<r><a></b>&#1;</r>", 1, 9}};
+  const std::string accepted[] = {
+      "<r a='x>y' b=\"it's\">&#x10FFFF;&#9;&#65;<![CDATA[&#1;<]]><!--&#0;--><?p &#1;?></r>",
+      "<!DOCTYPE r [<!ENTITY e \"&#1;>\">]><r/>", many + "/>"};
+  Document doc;
+  for (const auto& [text, line, column] : refused) {
+    EXPECT_FALSE(doc.LoadXml(text)) << text;
+    const ParseError& error = doc.LastParseError();
+    EXPECT_EQ(std::pair(error.line, error.column), std::pair(line, column)) << text;
+    EXPECT_FALSE(error.limit);
+  }
+  for (const std::string& text : accepted) {
+    Load(doc, text);
+    Load(doc, doc.Xml());
+  }
+}
+
+// A document beyond a limit is refused before it is parsed, and says which limit; one that
+// reaches every limit loads.
+TEST(XmlDocumentTest, RefusesWhatExceedsItsLimits) {
+  const Limits small{21, 2, 3};
+  testing::TempTree tree;
+  tree.AddFile("long.xml", "<r>" + std::string(15, 'x') + "</r>");
+  const std::tuple<std::function<bool(Document&)>, int64_t, int64_t, const char*> cases[] = {
+      {[&](Document& doc) { return doc.LoadXml("<r><a><b/></a></r>", small); }, 1, 7, "2 deep"},
+      {[&](Document& doc) { return doc.LoadXml("<r><a/><b/><c/></r>", small); }, 1, 12, "3 el"},
+      {[&](Document& doc) { return doc.Load(tree.Native("long.xml"), small); }, 0, 0, "21 bytes"},
+      {[&](Document& doc) { return doc.LoadXml("<r>" + std::string(15, 'x') + "</r>", small); }, 0,
+       0, "21 bytes"}};
+  Document doc;
+  for (const auto& [load, line, column, reason] : cases) {
+    EXPECT_FALSE(load(doc)) << reason;
+    const ParseError& error = doc.LastParseError();
+    EXPECT_EQ(std::pair(error.line, error.column), std::pair(line, column)) << error.reason;
+    EXPECT_TRUE(error.limit && error.reason.find(reason) != std::string::npos) << error.reason;
+  }
+  EXPECT_TRUE(doc.LoadXml("<r><a></a><b></b></r>", small));
+}
+
+// A file is read in the encoding its byte order mark, its spelling of "<" or its declaration
+// gives; bytes that are not in that encoding, or an encoding unknown, are refused.
+TEST(XmlDocumentTest, ReadsFilesInTheirEncoding) {
+  using namespace std::string_literals;
+  const std::pair<std::string, std::string> cases[] = {
+      {"\xFF\xFE<\0r\0>\0\xE9\0<\0/\0r\0>\0"s, "<r>\xC3\xA9</r>"},
+      {"\0<\0r\0>\0\xE9\0<\0/\0r\0>"s, "<r>\xC3\xA9</r>"},
+      {"\xFF\xFE\0\0<\0\0\0r\0\0\0/\0\0\0>\0\0\0"s, "<r/>"},
+      {"<?xml version='1.0' encoding='ISO-8859-1'?><r>\xE9</r>", "<r>\xC3\xA9</r>"},
+      {"\xFF\xFE<\0r\0>\0\x00\xD8<\0/\0r\0>\0"s, ""},
+      {"<?xml version='1.0' encoding='x-none'?><r/>", ""}};
+  testing::TempTree tree;
+  Document doc;
+  for (const auto& [bytes, xml] : cases) {
+    tree.AddFile("doc.xml", bytes);
+    EXPECT_EQ(doc.Load(tree.Native("doc.xml")), !xml.empty()) << doc.LastParseError().reason;
+    EXPECT_EQ(doc.Xml(), xml);
+  }
+  EXPECT_EQ(std::pair(doc.LastParseError().line, doc.LastParseError().column), std::pair(1l, 1l));
 }
 
 // Handles to no object fail with 91, misuse fails with 5; neither changes anything.
@@ -224,6 +305,33 @@ TEST(XmlDocumentTest, ChildrenNamesAndText) {
   EXPECT_EQ(doc.Xml(), "<r>x &lt; y</r>");
   r.SetText("");
   EXPECT_EQ(doc.Xml(), "<r/>");
+}
+
+// In a chain of nested elements, each asked for the elements below it, every level gets what a
+// walk of its subtree gives, in one walk of the chain rather than one per level (the test's time
+// limit sees the difference), also once the tree changes.
+TEST(XmlDocumentTest, FindsElementsBelowEachLevelOfADeepChain) {
+  constexpr int kDepth = 100000;
+  Document doc;
+  std::vector<Node> chain{doc.SetDocumentElement(doc.CreateElement("x"))};
+  Node middle;
+  for (int level = 1; level < kDepth; ++level) {
+    if (level == kDepth / 2) middle = chain.back().AppendElement("y", {});
+    chain.push_back(chain.back().AppendElement("x", {}));
+  }
+  Node bottom = chain.back().AppendElement("y", {});
+  const std::vector<Node> both{middle, bottom};
+  for (int level = 0; level < kDepth; ++level) {
+    ASSERT_EQ(chain[level].GetElementsByTagName("y"),
+              level < kDepth / 2 ? both : std::vector<Node>{bottom})
+        << level;
+  }
+  EXPECT_EQ(chain[kDepth - 2].GetElementsByTagName("*"), (std::vector<Node>{chain.back(), bottom}));
+  EXPECT_EQ(doc.AsNode().GetElementsByTagName("y"), both);
+  chain.back().RemoveChild(bottom);
+  EXPECT_EQ(chain[1].GetElementsByTagName("y"), std::vector<Node>{middle});
+  bottom = chain[kDepth - 2].AppendElement("y", {});
+  EXPECT_EQ(chain[1].GetElementsByTagName("y"), (std::vector<Node>{middle, bottom}));
 }
 
 // Pieces of all lengths, across the end of the start and the ends of blocks, come out whole and

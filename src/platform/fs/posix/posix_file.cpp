@@ -60,7 +60,7 @@ DateTime PosixFile::DateLastModified() const { return FromTimeT(Status().modifie
 
 std::unique_ptr<FileReader> PosixFile::Open() const {
   // O_NONBLOCK keeps opening a fifo from waiting for a writer; it changes nothing for files.
-  int descriptor = ::open(Native().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  int descriptor = OpenFile(Native(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
   if (descriptor < 0) Fail(LookupFailure(errno, kFileNotFound));
   auto reader = std::make_unique<PosixFileReader>(descriptor);
   // Only a regular file has an end to read to: a device (a link to /dev/zero) would be read

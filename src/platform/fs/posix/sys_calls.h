@@ -22,6 +22,9 @@ struct SysCallCounts {
 // The calls this thread has made so far.
 SysCallCounts CountedSysCalls();
 
+// A path longer than the system takes at once (PATH_MAX) is reached a few folders at a time, so
+// that items below such a path are found, read and listed like any other.
+
 // Each returns 0 or the errno value.
 int Stat(const std::string& path, struct stat& out);
 int LStat(const std::string& path, struct stat& out);
@@ -32,6 +35,8 @@ std::string GetExtendedAttribute(const std::string& path, const char* name);
 int RealPath(const std::string& path, std::string& out);
 // nullptr with errno set on failure; an empty path is the working directory.
 DIR* OpenDirectory(const std::string& path);
+// open(2): a descriptor, or -1 with errno set.
+int OpenFile(const std::string& path, int flags);
 
 // Failure numbers for errno values: looking an item up (`notFound` when it does not exist),
 // and listing a folder.
