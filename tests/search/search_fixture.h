@@ -38,7 +38,8 @@ inline std::string Summary(xml::Document& document, const std::string& below) {
     if (Lower(text).starts_with(Lower(below))) text.erase(0, below.size());
     std::set<std::string> items;
     for (const xml::Node& item : d.SelectNodes("./f|./a")) {
-      std::string name = item.GetAttribute("f_text").value_or(*item.GetAttribute("a_name"));
+      std::string name =
+          item.GetAttribute(item.NodeName() == "f" ? "f_text" : "a_name").value_or("<absent>");
       for (const xml::Node& p : item.SelectNodes("./p")) name += "#" + *p.GetAttribute("p_type");
       items.insert(name);
     }
