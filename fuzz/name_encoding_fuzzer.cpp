@@ -1,6 +1,8 @@
 // The encodings of names, on any bytes: what each promises, checked through its inverse where
 // one exists. A file's name goes from the disk through NameFromNative, then EncodeName or
 // EncodeExactName, into selections between apostrophes.
+#include <utf8proc.h>
+
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
@@ -43,6 +45,22 @@ std::string Unescaped(std::string_view encoded) {
   return text;
 }
 
+// Every character of lower-cased text is its own lower case, as the Unicode tables have it.
+void CheckFolded(std::string_view lower) {
+  auto* at = reinterpret_cast<const utf8proc_uint8_t*>(lower.data());
+  auto* end = at + lower.size();
+  while (at < end) {
+    utf8proc_int32_t c = 0;
+    utf8proc_ssize_t length = utf8proc_iterate(at, end - at, &c);
+    if (length <= 0) {
+      ++at;  // a byte that is not UTF-8, passed through
+      continue;
+    }
+    Require(utf8proc_tolower(c) == c, "a character left with a lower case of its own");
+    at += length;
+  }
+}
+
 void CheckNativeNames(std::string_view bytes) {
   std::string name = trl::NameFromNative(bytes);
   Require(trl::IsValidUtf8(name) && trl::IsXmlSafe(name), "a native name XML cannot carry");
@@ -68,6 +86,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   CheckNativeNames(text);
 
   std::string lower = trl::LowerCase(text);
+  CheckFolded(lower);
   Require(trl::LowerCase(lower) == lower, "lower-casing twice changed the text");
   Require(trl::IsValidUtf8(lower) == trl::IsValidUtf8(text), "lower-casing changed validity");
 

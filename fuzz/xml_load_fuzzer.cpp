@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "fuzz_input.h"
+#include "platform/failure.h"
 #include "trl/xml.h"
 
 namespace {
@@ -30,8 +31,16 @@ Node ScanChildren(const Node& parent, const std::string& tag, const std::string&
   return Node();
 }
 
+// Whether FindChild answers as a scan of the children does.
+void RequireScanAnswer(Document& document, const Node& parent, const std::string& tag,
+                       const std::string& name, const std::string& value, std::string_view what) {
+  Require(document.FindChild(parent, tag, name, value) == ScanChildren(parent, tag, name, value),
+          what);
+}
+
 // For elements with attributes: the index behind FindChild answers as a scan does, and still
-// does after the element it found was removed.
+// does after an element's key was rewritten and after the element was removed. Elements are
+// changed last to first, so that each is still there when its turn comes.
 void CheckKeyedLookups(Document& document) {
   std::vector<Node> elements = document.AsNode().GetElementsByTagName("*");
   elements.resize(std::min(elements.size(), kMostKeyedElements));
@@ -40,25 +49,29 @@ void CheckKeyedLookups(Document& document) {
     if (parent.Type() != NodeType::kElement) continue;
     std::string tag = element.NodeName();
     for (const auto& [name, value] : element.Attributes()) {
-      Node found = document.FindChild(parent, tag, name, value);
-      Require(found == ScanChildren(parent, tag, name, value), "FindChild differs from a scan");
+      RequireScanAnswer(document, parent, tag, name, value, "FindChild differs from a scan");
       // A name given twice keys the element by its first value only.
       if (element.GetAttribute(name) == value) {
-        Require(!found.IsNull(), "FindChild missed an element that is there");
+        Require(!document.FindChild(parent, tag, name, value).IsNull(),
+                "FindChild missed an element that is there");
       }
     }
   }
-  // Removal last: handles to removed elements go stale.
-  for (const Node& element : elements) {
-    Node parent = element.ParentNode();
-    if (parent.Type() != NodeType::kElement || element.Attributes().empty()) continue;
-    auto [name, value] = element.Attributes().front();
-    std::string tag = element.NodeName();
-    Node found = document.FindChild(parent, tag, name, value);
-    parent.RemoveChild(found);
-    Require(document.FindChild(parent, tag, name, value) == ScanChildren(parent, tag, name, value),
-            "FindChild differs from a scan after a removal");
-    return;
+  for (auto element = elements.rbegin(); element != elements.rend(); ++element) {
+    Node parent = element->ParentNode();
+    if (parent.Type() != NodeType::kElement || element->Attributes().empty()) continue;
+    auto [name, value] = element->Attributes().front();
+    std::string tag = element->NodeName();
+    std::string changed = value + "~";
+    try {
+      element->SetAttribute(name, changed);
+    } catch (const trl::Failure&) {
+      changed = value;  // text loaded that the layer would not write: the key stays
+    }
+    RequireScanAnswer(document, parent, tag, name, value, "FindChild differs after a key change");
+    RequireScanAnswer(document, parent, tag, name, changed, "FindChild misses a changed key");
+    parent.RemoveChild(*element);
+    RequireScanAnswer(document, parent, tag, name, changed, "FindChild differs after a removal");
   }
 }
 
