@@ -20,6 +20,9 @@ build_dir=$(realpath -m "${2:-$here/build-fuzz}")
 targets=${TARGETS:-"xml_load search compare filter merge pe_version name_encoding filter_names"}
 [[ $seconds =~ ^[1-9][0-9]*$ ]] || { echo "fuzz: SECONDS must be a whole number above 0" >&2; exit 2; }
 command -v clang++ >/dev/null || { echo "fuzz: clang++ is missing: ./setup.sh fuzz" >&2; exit 2; }
+for target in $targets; do
+  [[ -f $here/fuzz/${target}_fuzzer.cpp ]] || { echo "fuzz: no target $target" >&2; exit 2; }
+done
 
 if [[ ! -f $build_dir/build.ninja ]]; then
   launcher=()
@@ -68,7 +71,7 @@ for target in $targets; do
   fi
   # Runs that end on a finding print no final statistics; their last status line counts.
   runs=$(sed -n 's/^stat::number_of_executed_units: *//p' "$log" | tail -n 1)
-  [[ -n $runs ]] || runs=$(grep -o '^#[0-9]*' "$log" | tail -n 1 | tr -d '#')
+  if [[ -z $runs ]]; then runs=$(grep -o '^#[0-9]*' "$log" | tail -n 1 | tr -d '#' || true); fi
   runs=${runs:-0}
   total=$((total + runs))
   printf '%-14s %12s  %s\n' "$target" "$runs" "$result"
