@@ -1,16 +1,23 @@
 #!/usr/bin/env bash
 # Installs the Debian packages trlLocator needs (only those missing), then configures and builds.
-# Usage: ./setup.sh [example] [build-dir]     (default build dir: build)
+# Usage: ./setup.sh [example] [fuzz] [build-dir]     (default build dir: build)
 #   example  also installs the Node.js packages Debian ships on their own that the bundled example
 #            looks for (semver, graceful-fs, which, nopt), so that the example finds real software
+#   fuzz     also installs clang and its libFuzzer runtime, and builds nothing: bench/fuzz.sh
+#            builds the fuzz targets in a folder of their own
 set -euo pipefail
 
 here="$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)"
 example=0
-if [ "${1:-}" = example ]; then
-  example=1
+fuzz=0
+while [ $# -gt 0 ]; do
+  case "$1" in
+    example) example=1 ;;
+    fuzz) fuzz=1 ;;
+    *) break ;;
+  esac
   shift
-fi
+done
 build_dir="${1:-$here/build}"
 
 packages=(
@@ -23,6 +30,9 @@ packages+=(python3-jsonschema)
 command -v npm >/dev/null || packages+=(npm)
 if ((example)); then
   packages+=(node-semver node-graceful-fs node-which node-nopt)
+fi
+if ((fuzz)); then
+  packages+=(clang libclang-rt-14-dev)
 fi
 
 missing=()
@@ -44,6 +54,9 @@ if ((${#missing[@]})); then
   "${sudo[@]}" apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
 fi
 
+if ((fuzz)); then
+  exit 0
+fi
 if [ ! -f "$build_dir/build.ninja" ]; then
   cmake -S "$here" -B "$build_dir" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
 fi

@@ -56,7 +56,7 @@ const std::vector<FingerprintFile::Property>& FingerprintFile::Properties() cons
 
 const FingerprintFile::Details& FingerprintFile::FindDetails() const {
   if (details_) return *details_;
-  Details& details = details_.emplace();
+  Details& details = details_.emplace(Details{});
   Try(details.readFailures, [&] { details.id = ToInt32(TextOf(f_, vocab::f_id)); });
   Try(details.readFailures, [&] { details.maxMask = ToInt16(TextOf(f_, vocab::p_max)); });
   Try(details.readFailures, [&] { details.fileBit = ToInt16(TextOf(f_, vocab::f_bitmask)); });

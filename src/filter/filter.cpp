@@ -59,15 +59,17 @@ void Filter::WalkApplications() {
   OnError on{kClass, kFilterLabel};
   std::vector<xml::Node> computers;
   on([&] { computers = EveryElement(Use(objMatchesDOM), vocab::c); });
-  for (const xml::Node& c : computers) {
+  // A computer can stand inside a version that the rules remove.
+  VisitRemaining(computers, vocab::c, [&](const xml::Node& c) {
     for (const xml::Node& m : ChildrenOf(on, c, vocab::m)) {
       for (const xml::Node& d : ChildrenOf(on, m, vocab::d)) {
         for (const xml::Node& a : ChildrenOf(on, d, vocab::a)) {
-          if (!FilterApplication(a)) return;
+          if (!FilterApplication(a)) return false;
         }
       }
     }
-  }
+    return true;
+  });
 }
 
 bool Filter::FilterApplication(xml::Node a) {

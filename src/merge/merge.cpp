@@ -114,8 +114,8 @@ void Merge::Run() {
   // A find-or-add that fails leaves the element it last gave in use, as a failed step does.
   xml::Node oldComputer, oldDrive, oldFolder;
   bool going = true;
-  for (size_t ci = 0; going && ci < computers.size(); ++ci) {
-    const xml::Node& c = computers[ci];
+  // A computer can stand inside an application that is moved to the user data.
+  VisitRemaining(computers, vocab::c, [&](const xml::Node& c) {
     on([&] {
       oldComputer = Use(objSchema).AddComputer(TextOf(c, vocab::c_text), TextOf(c, vocab::c_name),
                                                oldRoot, lngComputerCounter);
@@ -139,7 +139,8 @@ void Merge::Run() {
         going = MergeFolder(d, oldFolder, defaults);
       }
     }
-  }
+    return going;
+  });
   SettleStatus();
   EndRun(on);
 }

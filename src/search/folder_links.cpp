@@ -48,9 +48,10 @@ void Search::WriteFolderLinks() {
   OnError on{search::kClass, search::kRunLabel};
   LinkNotes notes = std::exchange(linkNotes_, {});
   std::unordered_set<std::string> written;  // a folder walked twice lists its links twice
-  for (const auto& [text, target] : notes.links) {
+  for (const auto& note : notes.links) {
+    const std::string& text = note.first;
     for (const auto& root : notes.roots) {
-      auto rest = Below(target, root.real);
+      auto rest = Below(note.second, root.real);
       // A walk without recursion walks its folder only.
       if (!rest || (!root.recurse && !rest->empty())) continue;
       std::string relative = root.relative;

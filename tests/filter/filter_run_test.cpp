@@ -69,5 +69,15 @@ TEST_F(FilterRunTest, ReportsEachApplicationLeftWithAVersionAndCountsEveryApplic
   EXPECT_EQ(matches->AsNode().SelectSingleNode("/*/a").Xml(), kOutside);
 }
 
+// A computer can stand anywhere, even inside a version; one inside a version that the rules remove
+// goes with it, and is not walked any more.
+TEST_F(FilterRunTest, AComputerInsideARemovedVersionGoesWithIt) {
+  const std::string inner = R"(<c c_id="2"><m m_id="1"><d d_id="1">)" +
+                            Application("Inner", "3 2 2 1 1") + "</d></m></c>";
+  RunToEnd(LowWeights,
+           Parse(Matches({Application("Outer", "1 2 2 1 1|" + Version("2 1 2 1 1", inner))})));
+  EXPECT_THAT(events_, ElementsAre("S1:0/0", "S2:2/0", "POuter:2/1", "S3:2/1"));
+}
+
 }  // namespace
 }  // namespace trl::testing

@@ -41,6 +41,17 @@ TEST(MergeCounterTest, NumbersWhatItAddsAfterTheIdsInUse) {
   }
 }
 
+// A computer can stand anywhere, even inside an application; one inside an application that is
+// merged goes with it into the user data, and is not merged again on its own.
+TEST(MergeWalkTest, AComputerInsideAMergedApplicationGoesWithIt) {
+  const std::string inner = Place("Inner", "D:", "\\Z\\", Application("3"));
+  auto old = Parse(Results(""));
+  MergeNow(Parse("<o/>"), nullptr, old,
+           Parse(Results(Place("New", "E:", "\\Y\\",
+                               "<a a_id='2' v_id='1'><v v_id='1'>" + inner + "</v></a>"))));
+  EXPECT_EQ(Shape(old->DocumentElement()), "c1(m1(d1(a2)))");
+}
+
 // Records what an asynchronous run reports: "S<status>" and "P<a_name>" in order.
 class MergeRunTest : public ::testing::Test {
  protected:
