@@ -32,6 +32,7 @@ void DescendantIndex::Walked(pugi::xml_node node, size_t visited, pugi::xml_node
     walked_ = 0;
     return;
   }
+  if (built_) return;  // a walk the index cannot answer: one of a detached subtree
   walked_ += visited;
   if (walked_ > kWalks * std::max(treeSize_, kSmallestTree)) Build(document, holder);
 }
@@ -52,7 +53,6 @@ void DescendantIndex::Reset(size_t elements) {
 }
 
 void DescendantIndex::Build(pugi::xml_node document, pugi::xml_node holder) {
-  Drop();
   std::vector<uint32_t> open;  // the elements entered and not yet left
   for (pugi::xml_node at = document.first_child(); at && at != holder;) {
     bool element = at.type() == pugi::node_element;

@@ -30,7 +30,7 @@ class DescendantIndex {
   // once the other walks since have visited more nodes than kWalks such walks would, the index is
   // built over the tree of `document` (the holder of detached nodes left out).
   void Walked(pugi::xml_node node, size_t visited, pugi::xml_node document, pugi::xml_node holder);
-  // An element of the tree came or went.
+  // An element of the tree came or went: the index goes, emptied.
   void Drop();
   // A new tree of `elements` elements (0: not known).
   void Reset(size_t elements);

@@ -34,10 +34,12 @@ std::optional<ParseError> ReadBytes(const std::string& path, size_t limit, std::
   if (::fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
     expected = static_cast<size_t>(status.st_size) + 1;  // the end is seen without another read
   }
-  bytes.resize(std::min(expected, limit + 1));
+  // One byte past the limit, to see that it was passed (unless there is none).
+  const size_t most = std::max(limit, limit + 1);
+  bytes.resize(std::min(expected, most));
   size_t used = 0;
   for (;;) {
-    if (used == bytes.size()) bytes.resize(std::min(bytes.size() * 2, limit + 1));
+    if (used == bytes.size()) bytes.resize(std::min(bytes.size() * 2, most));
     ssize_t got = ::read(descriptor, bytes.data() + used, bytes.size() - used);
     if (got < 0 && errno == EINTR) continue;
     if (got < 0) return Unreadable(std::strerror(errno));

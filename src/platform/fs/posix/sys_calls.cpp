@@ -28,12 +28,9 @@ int OpenInSteps(const std::string& folder) {
   for (size_t at = absolute ? 1 : 0; descriptor >= 0 && at < folder.size();) {
     size_t end = folder.size();
     if (end - at >= PATH_MAX) {
-      end = folder.rfind('/', at + PATH_MAX - 1);
-      if (end == std::string::npos || end <= at) {
-        ::close(descriptor);
-        errno = ENAMETOOLONG;  // one name longer than any the system takes
-        return -1;
-      }
+      size_t slash = folder.rfind('/', at + PATH_MAX - 1);
+      // Without one, a name is longer than any the system takes, and the rest is refused.
+      if (slash != std::string::npos && slash > at) end = slash;
     }
     int next =
         ::openat(descriptor, folder.substr(at, end - at).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
