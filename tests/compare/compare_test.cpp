@@ -431,18 +431,22 @@ TEST_F(CompareTest, DraftedCopiesGiveTheResultsOfCopiesMadeAtEveryFind) {
 }
 
 // Explaining keeps each version taken back, with its place, and of each found file the weighted
-// properties that disagreed, with the values expected and found.
+// properties that disagreed, with the values expected (none when unreadable) and found.
 TEST_F(CompareTest, ExplainingKeepsWhatWasTakenBackAndWhatDisagreed) {
   std::string fingerprint =
       "<fp><a a_id='1' a_name='A'><v v_id='1' v_name='one' v_seq='1'><f f_id='1' f_name='a.exe' "
       "f_relpath='' f_weight='1'><p p_type='2' p_weight='1' p_value='9'/><p p_type='3' "
-      "p_weight='0' p_value='x'/><p p_type='4' p_weight='2' p_value='2024-05-06 07:08:09'/></f>"
+      "p_weight='0' p_value='x'/><p p_type='4' p_weight='2' p_value='2024-05-06 07:08:09'/><p "
+      "p_type='3' p_weight='3' p_value='AB'/><p p_type='1' p_weight='4' p_value='1.0'/><p "
+      "p_type='2' p_weight='5' p_value='eight'/></f>"
       "</v>" +
       Version("v_id='2' v_name='two' v_seq='2'", "a.exe:1 gone.dll:2") + "</a></fp>";
   auto results =
       Parse(Run(fingerprint, LocalFiles({{"\\p\\", {"a.exe", "gone.dll"}}}), true, nullptr, true));
-  EXPECT_THAT(ValuesOf(*results, "//p_local", "p_expected"), ElementsAre("9"));
-  EXPECT_THAT(ValuesOf(*results, "//a/v/f/p_local", "p_value"), ElementsAre("5"));
+  EXPECT_THAT(ValuesOf(*results, "//p_local", "p_expected"),
+              ElementsAre("9", "ab", "1.0", "<absent>"));
+  EXPECT_THAT(ValuesOf(*results, "//a/v/f/p_local", "p_value"),
+              ElementsAre("5", "2c3ccd32927839768639b88829a5c04a", "", "5"));
   EXPECT_THAT(ValuesOf(*results, "/*/taken_back", "d_text"), ElementsAre("\\p\\"));
   EXPECT_THAT(ValuesOf(*results, "/*/taken_back/v/f[@f_exists='0']", "f_name"),
               ElementsAre("gone.dll"));
