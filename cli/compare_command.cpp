@@ -14,6 +14,7 @@ struct CompareOptions {
   std::string applicationOptions;
   std::string localFiles;
   std::string fingerprint;
+  bool explain = false;
   StageOptions stage;
 };
 
@@ -26,6 +27,7 @@ int RunCompare(const CompareOptions& options) {
   ReportPrinter printer(options.stage);
   Compare compare(FileSystemWithShares(options.stage.shares));
   compare.Asynchronous(false);
+  compare.Explaining(options.explain);
   std::string text = compare.Start(applicationOptions, localFiles, fingerprint);
   return WriteStageOutput(text, "compare", options.stage);
 }
@@ -41,6 +43,9 @@ std::function<int()> AddCompareCommand(CLI::App& app) {
   command->add_option("--local-files", options->localFiles, "Local-files document of a search")
       ->required();
   command->add_option("--fingerprint", options->fingerprint, "Fingerprint database")->required();
+  command->add_flag("--explain", options->explain,
+                    "Keep in the matches, for trllocator explain, the versions taken back for "
+                    "lack of a weighted file and the values of properties that disagreed");
   AddShareOption(*command, options->stage);
   AddOutputOption(*command, options->stage);
   return [command, options] { return command->parsed() ? RunCompare(*options) : -1; };

@@ -45,6 +45,12 @@ int16_t ParseNumber(std::string_view text) {
 
 }  // namespace
 
+std::string_view FilterName(int16_t bit) {
+  auto known = std::find_if(kFilterNames.begin(), kFilterNames.end(),
+                            [&](const auto& entry) { return entry.second == bit; });
+  return known != kFilterNames.end() ? known->first : "";
+}
+
 int16_t ParseFilterOptions(std::string_view text) {
   if (!text.empty() &&
       std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; })) {

@@ -1,7 +1,10 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <string_view>
+
+#include "trl/filter.h"
 
 namespace trl::cli {
 
@@ -9,5 +12,11 @@ namespace trl::cli {
 // low-weights, missing-files, low-file-count, duplicate-matches, flag-unknowns, flag-unmanaged
 // and all. Anything else is a CommandError.
 int16_t ParseFilterOptions(std::string_view text);
+
+// The rules in the order the filter applies them.
+inline constexpr std::array<int16_t, 6> kFilterOrder{LowWeights,       MissingFiles, LowFileCount,
+                                                     DuplicateMatches, FlagUnknowns, FlagUnmanaged};
+// The name of one rule's bit, as ParseFilterOptions takes it.
+std::string_view FilterName(int16_t bit);
 
 }  // namespace trl::cli

@@ -7,6 +7,7 @@
 #include "check_command.h"
 #include "command_error.h"
 #include "compare_command.h"
+#include "explain_command.h"
 #include "filter_command.h"
 #include "fingerprint_command.h"
 #include "inventory_command.h"
@@ -25,10 +26,11 @@ int main(int argc, char** argv) {
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
       "2 a bad command line or input document; 3 done, but failures were reported (locate); "
       "130 cancelled by Ctrl-C.");
-  std::vector<std::function<int()>> commands{
-      AddSearchCommand(app),    AddCompareCommand(app), AddFilterCommand(app),
-      AddMergeCommand(app),     AddLocateCommand(app),  AddFingerprintCommand(app),
-      AddInventoryCommand(app), AddManageCommand(app),  AddCheckCommand(app)};
+  std::vector<std::function<int()>> commands{AddSearchCommand(app),    AddCompareCommand(app),
+                                             AddFilterCommand(app),    AddMergeCommand(app),
+                                             AddLocateCommand(app),    AddFingerprintCommand(app),
+                                             AddInventoryCommand(app), AddManageCommand(app),
+                                             AddCheckCommand(app),     AddExplainCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <unordered_map>
 #include <unordered_set>
@@ -45,6 +46,13 @@ class Compare : public Worker {
   // case, as the local-file index holds it) were the fingerprint file `f`, or "" when the folder
   // does not fit the file's f_relpath.
   static std::string FindCommonPath(const xml::Node& f, std::string folder);
+
+  // On: the results also tell why, in elements of their own that the other stages pass over:
+  // each version taken back for lack of a weighted file is kept in a `taken_back` element under
+  // the root, with its place, and each found file whose properties disagreed holds a `p_local`
+  // per disagreeing property with the value expected and the value the file has. Off (the
+  // default): the results hold only the matches.
+  void Explaining(bool on) { explaining_ = on; }
 
  protected:
   void RunBody() override;
@@ -100,6 +108,11 @@ class Compare : public Worker {
 
   int16_t RemoveIncompleteApplications(const std::string& id, int32_t highestSequence);
   void RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence);
+  // Keeps a copy of the version `v` of the application copy `copy`, with its place, before it is
+  // taken back.
+  void KeepTakenBack(const xml::Node& copy, const xml::Node& v);
+  // Records on the results file `copy` the properties the last MatchFile found disagreeing.
+  void KeepDisagreements(xml::Node copy) const;
   // Takes out the copies with this a_id left without versions, each with whatever that leaves
   // empty, in document order.
   void RemoveEmptiedCopies(const std::string& id);
@@ -126,6 +139,15 @@ class Compare : public Worker {
   int32_t lngFolderCounter = 0;
   std::string startTime_;  // formatted
   bool draftCopies_ = true;
+  bool explaining_ = false;
+  // A property of the file MatchFile tested last that did not agree: its kind, the value expected
+  // and the file's own, each as it was compared (absent when it could not be read).
+  struct Disagreement {
+    int16_t kind;
+    std::optional<std::string> expected, local;
+  };
+  std::vector<Disagreement> disagreements_;
+  std::vector<xml::Node> takenBack_;  // made while explaining, put under the root at the end
   std::unordered_set<const void*> draftedVersions_;  // of the application being matched
   // A place the application being matched was found in: the listed drive and the fingerprint
   // application, with the computer, drive, folder and copy the results hold for them.

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <optional>
 #include <unordered_set>
+#include <utility>
 
 #include "compare/candidates.h"
 #include "compare/compare_names.h"
@@ -105,6 +106,9 @@ void Compare::Match() {
 void Compare::Finish() {
   OnError on{kClass, compare::kMatchLabel};
   std::string endTime = FormatDateTime(Now());
+  for (const xml::Node& kept : std::exchange(takenBack_, {})) {
+    on([&] { objResultsDOM->DocumentElement().AppendChild(kept); });
+  }
   on([&] { AddEventsXML(*objResultsDOM); });
   xml::Node root;
   on([&] { root = objResultsDOM->DocumentElement(); });
@@ -174,7 +178,10 @@ std::unordered_set<const void*> Compare::DraftableVersions(
   // A version without a v_id gets a new copy at every find.
   std::unordered_set<const void*> drafted;
   std::optional<std::string> id = a.GetAttribute(vocab::a_id);
-  if (!draftCopies_ || !id || id->find('\'') != std::string::npos || !objSchema) return drafted;
+  // Explaining keeps what pruning takes back, so every copy is made.
+  if (!draftCopies_ || explaining_ || !id || id->find('\'') != std::string::npos || !objSchema) {
+    return drafted;
+  }
   std::unordered_map<std::string, int> versionsById;
   for (const xml::Node& v : versions) ++versionsById[v.GetAttribute(vocab::v_id).value_or("")];
   for (const xml::Node& v : versions) {
@@ -372,6 +379,7 @@ void Compare::ReleaseDocuments() {
   copiesById_.clear();
   knownCopies_.clear();
   filesSeen_.clear();
+  takenBack_.clear();
 }
 
 }  // namespace trl

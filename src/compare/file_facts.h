@@ -28,6 +28,8 @@ class Learnt {
     }
     return *value_;
   }
+  // The value read so far, or null.
+  const T* Known() const { return value_ ? &*value_ : nullptr; }
 
  private:
   std::optional<T> value_;

@@ -65,11 +65,36 @@ bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& sch
   }
 }
 
+// The file's value of a property of this kind as it was compared, when it was read.
+std::optional<std::string> LocalValue(int16_t kind, const LocalFileFacts& facts) {
+  auto text = [](const std::string* value) {
+    return value ? std::optional<std::string>(*value) : std::nullopt;
+  };
+  switch (kind) {
+    case 1:
+      return text(facts.version.Known());
+    case 2:
+      return facts.size.Known() ? std::optional(std::to_string(*facts.size.Known())) : std::nullopt;
+    case 3:
+      return text(facts.digest.Known());
+    case 4:
+      return text(facts.written.Known());
+    default:
+      return std::nullopt;
+  }
+}
+
+std::optional<std::string> ExpectedValue(const FingerprintFile::Property& property) {
+  if (property.expectedFailure || property.conversionFailure) return std::nullopt;
+  return property.kind == 2 ? std::to_string(property.expectedNumber) : property.expectedText;
+}
+
 }  // namespace
 
 int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
   OnError on{kClass, compare::kMatchFileLabel};
   int16_t mask = 0;
+  disagreements_.clear();
   auto& seen = filesSeen_[path];
   if (!seen) seen = std::make_unique<LocalFileFacts>();
   LocalFileFacts& facts = *seen;
@@ -89,8 +114,22 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
     bool agrees = false;
     on([&] { agrees = PropertyAgrees(property, Use(objSchema), file, facts); });
     if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });
+    // A property without weight does not count, so it explains nothing.
+    if (explaining_ && !agrees && property.bit != 0) {
+      disagreements_.push_back(
+          {property.kind, ExpectedValue(property), LocalValue(property.kind, facts)});
+    }
   }
   return mask;
+}
+
+void Compare::KeepDisagreements(xml::Node copy) const {
+  for (const Disagreement& disagreement : disagreements_) {
+    xml::Node p =
+        copy.AppendElement(vocab::p_local, {{vocab::p_type, std::to_string(disagreement.kind)}});
+    if (disagreement.expected) p.SetAttribute(vocab::p_expected, *disagreement.expected);
+    if (disagreement.local) p.SetAttribute(vocab::p_value, *disagreement.local);
+  }
 }
 
 bool Compare::UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int16_t mask) {
@@ -107,6 +146,7 @@ bool Compare::UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int
   on([&] { copy.SetAttribute(vocab::p_max, std::to_string(details.maxMask)); });
   on([&] { copy.SetAttribute(vocab::p_act, std::to_string(mask)); });
   on([&] { copy.SetAttribute(vocab::f_exists, "1"); });
+  if (explaining_) on([&] { KeepDisagreements(copy); });
   int32_t versionScore = 0, filesFound = 0;
   on([&] { versionScore = ToInt32(TextOf(vResult, vocab::v_act)); });
   on([&] { filesFound = ToInt32(TextOf(vResult, vocab::f_act)); });

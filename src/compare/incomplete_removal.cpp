@@ -3,6 +3,7 @@
 #include <optional>
 #include <string_view>
 #include <tuple>
+#include <utility>
 
 #include "compare/compare_names.h"
 #include "compare/version_draft.h"
@@ -56,6 +57,7 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
       });
       // A version goes only when a file that carries weight was not found; the selection is then
       // made afresh.
+      if (missing != 0 && explaining_) on([&] { KeepTakenBack(copy, v); });
       if (missing != 0 && on([&] { copy.RemoveChild(v); })) {
         removed = true;
         break;
@@ -63,6 +65,22 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
     }
   }
   on([&] { copy.SetAttribute(vocab::a_max_seq, std::to_string(highestSequence)); });
+}
+
+void Compare::KeepTakenBack(const xml::Node& copy, const xml::Node& v) {
+  xml::Node d = copy.ParentNode();
+  xml::Node m = d.ParentNode();
+  xml::Node c = m.ParentNode();
+  // The place's shown names: the compare may take the place itself out once it is empty.
+  xml::Node kept = objResultsDOM->CreateElement(vocab::taken_back);
+  const std::pair<xml::Node, std::string_view> names[] = {
+      {c, vocab::c_text}, {c, vocab::c_local}, {m, vocab::m_text},
+      {d, vocab::d_text}, {copy, vocab::a_id}, {copy, vocab::a_name}};
+  for (const auto& [element, attribute] : names) {
+    if (auto value = element.GetAttribute(attribute)) kept.SetAttribute(attribute, *value);
+  }
+  kept.AppendChild(v.CloneNode(true));
+  takenBack_.push_back(kept);
 }
 
 void Compare::RemoveEmptiedCopies(const std::string& id) {

@@ -28,6 +28,10 @@ inline constexpr std::string_view fingerprint_root =
     "trl_fingerprint";  // root of a database the command line creates
 inline constexpr std::string_view events = "events";
 inline constexpr std::string_view event = "event";
+// What a compare that explains keeps besides the matches: a version it took back, with its place,
+// and a property of a found file that disagreed.
+inline constexpr std::string_view taken_back = "taken_back";
+inline constexpr std::string_view p_local = "p_local";
 
 // Attributes.
 inline constexpr std::string_view a_dupes_q = "a_dupes_q";
@@ -86,6 +90,7 @@ inline constexpr std::string_view m_text = "m_text";
 inline constexpr std::string_view m_type = "m_type";
 inline constexpr std::string_view p_act = "p_act";
 inline constexpr std::string_view p_bitmask = "p_bitmask";
+inline constexpr std::string_view p_expected = "p_expected";
 inline constexpr std::string_view p_max = "p_max";
 inline constexpr std::string_view p_type = "p_type";
 inline constexpr std::string_view p_value = "p_value";

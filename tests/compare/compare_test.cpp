@@ -97,8 +97,10 @@ class NamedFiles : public fs::FileSystem {
 
 class SwitchedCompare : public Compare {
  public:
-  SwitchedCompare(bool draft, std::unique_ptr<fs::FileSystem> files) : Compare(std::move(files)) {
+  SwitchedCompare(bool draft, std::unique_ptr<fs::FileSystem> files, bool explain)
+      : Compare(std::move(files)) {
     DraftCopies(draft);
+    Explaining(explain);
   }
 };
 
@@ -110,8 +112,10 @@ class CompareTest : public ::testing::Test {
 
   // The text of a synchronous run, on NamedFiles unless `files` are given.
   static std::string Run(std::string_view fingerprint, std::string_view localFiles,
-                         bool draft = true, std::unique_ptr<fs::FileSystem> files = nullptr) {
-    SwitchedCompare compare(draft, files ? std::move(files) : std::make_unique<NamedFiles>());
+                         bool draft = true, std::unique_ptr<fs::FileSystem> files = nullptr,
+                         bool explain = false) {
+    SwitchedCompare compare(draft, files ? std::move(files) : std::make_unique<NamedFiles>(),
+                            explain);
     compare.Asynchronous(false);
     return compare.Start(nullptr, Parse(localFiles), Parse(fingerprint));
   }
@@ -352,6 +356,15 @@ std::string Timeless(const std::string& text) {
   return std::regex_replace(text, times, "");
 }
 
+// The results without what a run that explains keeps besides them.
+std::string WithoutReasons(const std::string& results) {
+  auto document = Parse(results);
+  // Last first: a version taken back holds files with their own.
+  auto kept = document->AsNode().SelectNodes("//taken_back | //p_local");
+  for (auto at = kept.rbegin(); at != kept.rend(); ++at) at->ParentNode().RemoveChild(*at);
+  return document->Xml();
+}
+
 // A fingerprint and a local-files document drawn from `seed`.
 std::pair<std::string, std::string> Draw(uint32_t seed) {
   std::mt19937 rng(seed);
@@ -400,17 +413,43 @@ std::pair<std::string, std::string> Draw(uint32_t seed) {
 }
 
 TEST_F(CompareTest, DraftedCopiesGiveTheResultsOfCopiesMadeAtEveryFind) {
-  int found = 0, empty = 0;
+  int found = 0, empty = 0, takenBack = 0;
   for (uint32_t seed = 1; seed <= 3000; ++seed) {
     auto [fingerprint, localFiles] = Draw(seed);
     std::string literal = Timeless(Run(fingerprint, localFiles, false));
     ASSERT_EQ(Timeless(Run(fingerprint, localFiles, true)), literal) << "seed " << seed << "\n"
                                                                      << fingerprint << "\n"
                                                                      << localFiles;
+    std::string explained = Run(fingerprint, localFiles, true, nullptr, true);
+    ASSERT_EQ(Timeless(WithoutReasons(explained)), literal) << "seed " << seed;
+    takenBack += explained.find("<taken_back") != std::string::npos;
     ++(literal.find("<v ") != std::string::npos ? found : empty);
   }
   EXPECT_GT(found, 1500);
   EXPECT_GT(empty, 500);
+  EXPECT_GT(takenBack, 500);
+}
+
+// Explaining keeps each version taken back, with its place, and of each found file the weighted
+// properties that disagreed, with the values expected (none when unreadable) and found.
+TEST_F(CompareTest, ExplainingKeepsWhatWasTakenBackAndWhatDisagreed) {
+  std::string fingerprint =
+      "<fp><a a_id='1' a_name='A'><v v_id='1' v_name='one' v_seq='1'><f f_id='1' f_name='a.exe' "
+      "f_relpath='' f_weight='1'><p p_type='2' p_weight='1' p_value='9'/><p p_type='3' "
+      "p_weight='0' p_value='x'/><p p_type='4' p_weight='2' p_value='2024-05-06 07:08:09'/><p "
+      "p_type='3' p_weight='3' p_value='AB'/><p p_type='1' p_weight='4' p_value='1.0'/><p "
+      "p_type='2' p_weight='5' p_value='eight'/></f>"
+      "</v>" +
+      Version("v_id='2' v_name='two' v_seq='2'", "a.exe:1 gone.dll:2") + "</a></fp>";
+  auto results =
+      Parse(Run(fingerprint, LocalFiles({{"\\p\\", {"a.exe", "gone.dll"}}}), true, nullptr, true));
+  EXPECT_THAT(ValuesOf(*results, "//p_local", "p_expected"),
+              ElementsAre("9", "ab", "1.0", "<absent>"));
+  EXPECT_THAT(ValuesOf(*results, "//a/v/f/p_local", "p_value"),
+              ElementsAre("5", "2c3ccd32927839768639b88829a5c04a", "", "5"));
+  EXPECT_THAT(ValuesOf(*results, "/*/taken_back", "d_text"), ElementsAre("\\p\\"));
+  EXPECT_THAT(ValuesOf(*results, "/*/taken_back/v/f[@f_exists='0']", "f_name"),
+              ElementsAre("gone.dll"));
 }
 
 }  // namespace
