@@ -13,8 +13,8 @@ namespace {
 
 using nlohmann::json;
 
-// One application updated, one that two versions fit alike, one gone; on a remote computer, so
-// that folders need no disk.
+// One application updated, one that two versions fit alike, one that no version fits wholly, one
+// gone; on a remote computer, so that folders need no disk.
 constexpr const char* kPlace =
     "<c c_id='1' c_text='pc' c_name='pc' c_local='0'><m m_id='1' "
     "m_text='C:' m_name='c:'>";
@@ -27,7 +27,10 @@ constexpr const char* kAfter =
     "v_name='1.1' v_seq='11' a_manage='1'><v v_id='11' v_max='3' v_act='2' f_max='2' f_act='2'><f "
     "f_id='1' p_act='1'/></v></a></d><d d_id='2' d_text='\\twin\\' d_name='\\twin\\'><a a_id='2' "
     "a_name='T\xe7\x94\xb0in' v_id='-1' v_name='Multiple Matches' v_seq='-1' a_manage='0'><v "
-    "v_guess='21' v_id='-1' v_max='4' v_act='4' f_max='1' f_act='1'/></a></d>";
+    "v_guess='21' v_id='-1' v_max='4' v_act='4' f_max='1' f_act='1'/></a></d><d d_id='4' "
+    "d_text='\\odd\\' d_name='\\odd\\'><a a_id='4' a_name='Odd' v_id='-1' v_name='Unsupported "
+    "Version' v_seq='-1' a_manage='0'><v v_guess='40' v_id='-1' v_max='8' v_act='2' f_max='4' "
+    "f_act='1'/></a></d>";
 
 class FindingsFormatsTest : public ::testing::Test {
  protected:
@@ -39,7 +42,9 @@ class FindingsFormatsTest : public ::testing::Test {
     // The digest has weight 1, the size weight 2: p_act 1 says only the digest agreed.
     auto fingerprint = testing::Parse(
         "<fp><a a_id='1'><v v_id='11' v_name='1.1'><f f_id='1'><p p_type='3' p_weight='1'/><p "
-        "p_type='2' p_weight='2'/></f></v></a><a a_id='2'><v v_id='21' v_name='2.1'/></a></fp>");
+        "p_type='2' p_weight='2'/></f></v></a><a a_id='2'><v v_id='21' v_name='2.1'/></a><a "
+        "a_id='4'><v "
+        "v_id='40' v_name='4.0'/></a></fp>");
     findings_ = Inventory(*before_).Changes(*merged_, *fingerprint);
   }
   xml::DocumentPtr before_, merged_;
@@ -49,7 +54,7 @@ class FindingsFormatsTest : public ::testing::Test {
 // Each application's JSON, read back by a parser, says what its element in the user data says.
 TEST_F(FindingsFormatsTest, JsonSaysWhatTheUserDataSays) {
   json document = json::parse(FindingsJson(findings_, nullptr));
-  ASSERT_EQ(document["applications"].size(), 3u);
+  ASSERT_EQ(document["applications"].size(), 4u);
   for (const json& app : document["applications"]) {
     std::string id = app["application_id"];
     if (app["verdict"] == "missing") {
@@ -70,11 +75,12 @@ TEST_F(FindingsFormatsTest, JsonSaysWhatTheUserDataSays) {
     EXPECT_EQ(app["files"]["expected"], std::stoi(*v.GetAttribute("f_max")));
     EXPECT_EQ(app["computer"], "pc");
   }
-  const json& one = document["applications"][1];
+  const json& one = document["applications"][2];
   EXPECT_EQ(one["folder"], "C:/one/");
   EXPECT_EQ(one["change"], "updated");
   EXPECT_EQ(one["changed_from"], "1.0");
-  const json& twin = document["applications"][2];
+  EXPECT_EQ(document["applications"][1]["version"]["name"], "Unsupported Version");
+  const json& twin = document["applications"][3];
   EXPECT_EQ(twin["verdict"], "unidentified");
   EXPECT_EQ(twin["best_guess"], (json{{"id", "21"}, {"name", "2.1"}}));
 }
@@ -97,9 +103,10 @@ TEST_F(FindingsFormatsTest, BomAndTableShowHowSureTheVerdictIs) {
             (std::vector<std::string>{"filename", "hash-comparison"}));
   EXPECT_DOUBLE_EQ(bom["components"][0]["evidence"]["identity"][0]["confidence"], 2.0 / 3);
   bom = json::parse(CycloneDxBom(findings_, true));
-  ASSERT_EQ(bom["components"].size(), 2u);
-  EXPECT_EQ(bom["components"][1]["version"], "2.1");
-  EXPECT_DOUBLE_EQ(bom["components"][1]["evidence"]["identity"][0]["confidence"], 0.5);
+  ASSERT_EQ(bom["components"].size(), 3u);
+  EXPECT_DOUBLE_EQ(bom["components"][0]["evidence"]["identity"][0]["confidence"], 0.125);
+  EXPECT_EQ(bom["components"][2]["version"], "2.1");
+  EXPECT_DOUBLE_EQ(bom["components"][2]["evidence"]["identity"][0]["confidence"], 0.5);
 
   // Below 70%: One goes; the missing, which have no score, stay.
   std::string strong = RenderFindings({.format = "table", .minScore = 70}, findings_, nullptr);
