@@ -18,7 +18,10 @@ here=$(cd "$(dirname "$0")/.." && pwd)
 seconds=${1:-60}
 build_dir=$(realpath -m "${2:-$here/build-fuzz}")
 targets=${TARGETS:-"xml_load search compare filter merge pe_version name_encoding filter_names"}
-[[ $seconds =~ ^[1-9][0-9]*$ ]] || { echo "fuzz: SECONDS must be a whole number above 0" >&2; exit 2; }
+if [[ ! $seconds =~ ^[1-9][0-9]*$ ]]; then
+  echo "fuzz: SECONDS must be a whole number above 0" >&2
+  exit 2
+fi
 command -v clang++ >/dev/null || { echo "fuzz: clang++ is missing: ./setup.sh fuzz" >&2; exit 2; }
 for target in $targets; do
   [[ -f $here/fuzz/${target}_fuzzer.cpp ]] || { echo "fuzz: no target $target" >&2; exit 2; }
@@ -65,8 +68,8 @@ for target in $targets; do
     result="nothing found"
   else
     status=1
-    found=$(find "$findings" -name "$target-*" -newermt "@$before" -not -name "$target-slow-unit-*" |
-      head -n 1)
+    found=$(find "$findings" -name "$target-*" -not -name "$target-slow-unit-*" \
+      -newermt "@$before" | head -n 1)
     result="FOUND ${found:-(see $log)}"
   fi
   # Runs that end on a finding print no final statistics; their last status line counts.
