@@ -77,6 +77,15 @@ bool Document::Impl::Load(std::string_view text, const Limits& limits) {
     Reset(ErrorAt(text, check.fault->offset, check.fault->reason));
     return false;
   }
+  // The parser takes several top-level elements; XML has one root only.
+  pugi::xml_node second =
+      doc.document_element() ? doc.document_element().next_sibling() : pugi::xml_node();
+  while (second && second.type() != pugi::node_element) second = second.next_sibling();
+  if (second) {
+    Reset(ErrorAt(text, static_cast<size_t>(std::max<ptrdiff_t>(second.offset_debug(), 0)),
+                  "a second root element"));
+    return false;
+  }
   descendants.Reset(check.elements);
   return true;
 }

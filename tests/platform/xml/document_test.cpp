@@ -104,7 +104,8 @@ TEST(XmlDocumentTest, LoadsOnlyWellFormedText) {
       {"<r a='<'/>", 1, 7},
       {"<r>&#1;<a></b></r>", 1, 4},
       {"<r><a></b>&#1;</r>", 1, 9},
-      {"<!DOCTYPE r><r>&#1;</r>", 1, 16}};
+      {"<!DOCTYPE r><r>&#1;</r>", 1, 16},
+      {"<r/>\n<s/>", 2, 2}};
   const std::string accepted[] = {
       "<r a='x>y' b=\"it's\">&#x10FFFF;&#9;&#65;<![CDATA[&#1;<]]><!--&#0;--><?p &#1;?></r>",
       "<!DOCTYPE r SYSTEM \"x>&#1;\" [<!ENTITY e \"&#1;>\">]><r/>", many + "/>"};
