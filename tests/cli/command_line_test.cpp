@@ -192,8 +192,10 @@ TEST_F(DocumentFilesTest, FoldersGivenOnTheCommandLineAreSearchedAsGiven) {
   EXPECT_EQ(Read("out.xml").find("inside"), std::string::npos);
   EXPECT_NE(Read("out.xml").find("f_text=\"file\""), std::string::npos);
   std::string left;
-  for (const auto& glob : SearchOptionsForPaths({"/"})->AsNode().SelectNodes("//d_search_exclude"))
+  auto wholeDisk = SearchOptionsForPaths({"/"});
+  for (const auto& glob : wholeDisk->AsNode().SelectNodes("//d_search_exclude")) {
     left += glob.Text() + " ";
+  }
   EXPECT_EQ(left, "/proc /sys /dev ");
   EXPECT_THROW(SearchOptionsForPaths({"file"}), CommandError);
   EXPECT_THROW(SearchOptionsForPaths({"none"}), CommandError);
