@@ -75,26 +75,33 @@ Documents LoadDocuments(const LocateOptions& options) {
 }
 
 Documents LoadNamedDocuments(const LocateOptions& options, const std::string& userData) {
-  if (options.searchOptions.empty() && options.applicationOptions.empty() &&
-      options.fingerprint.empty() && userData.empty()) {
-    auto example = [](const char* name) {
-      std::string path = (std::filesystem::path(kExamplesDir) / name).string();
-      if (!std::filesystem::exists(path)) {
-        throw CommandError(fmt::format(
-            "the bundled example is not at '{}': name the documents with --search-options, "
-            "--fingerprint and the other document options",
-            path));
-      }
-      return path;
-    };
-    return {LoadDocumentFile(example("search-options.xml"), kSearchOptionsRole),
-            LoadDocumentFile(example("application-options.xml"), kApplicationOptionsRole),
-            LoadDocumentFile(example("fingerprint.xml"), kFingerprintRole), nullptr};
+  auto example = [](const char* name, const DocumentRole& role) {
+    std::string path = (std::filesystem::path(kExamplesDir) / name).string();
+    if (!std::filesystem::exists(path)) {
+      throw CommandError(fmt::format(
+          "the bundled example is not at '{}': name the documents with --search-options, "
+          "--fingerprint and the other document options",
+          path));
+    }
+    return LoadDocumentFile(path, role);
+  };
+  // A document not named comes from the bundled example: a second run with the user data the
+  // first one saved searches as the first did. The example's application options go only with
+  // its fingerprint, whose applications they select.
+  Documents documents{LoadOptionalDocumentFile(options.searchOptions, kSearchOptionsRole),
+                      LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole),
+                      LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole),
+                      LoadOptionalDocumentFile(userData, kUserDataRole)};
+  if (!documents.searchOptions && options.paths.empty()) {
+    documents.searchOptions = example("search-options.xml", kSearchOptionsRole);
   }
-  return {LoadOptionalDocumentFile(options.searchOptions, kSearchOptionsRole),
-          LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole),
-          LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole),
-          LoadOptionalDocumentFile(userData, kUserDataRole)};
+  if (!documents.fingerprint) {
+    documents.fingerprint = example("fingerprint.xml", kFingerprintRole);
+    if (!documents.applicationOptions) {
+      documents.applicationOptions = example("application-options.xml", kApplicationOptionsRole);
+    }
+  }
+  return documents;
 }
 
 int Attribute(const std::string& updateXml, std::string_view name) {

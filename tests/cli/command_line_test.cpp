@@ -259,6 +259,11 @@ TEST_F(DocumentFilesTest, FirstSaveMakesTheUserDataAndReportedFailuresExitThree)
             kExitFailuresReported);
   EXPECT_EQ(::testing::internal::GetCapturedStderr(),
             "trllocator: error: '" + tree_.Native("app/tool.exe") + "': Path/File access error\n");
+  // A second run on the user data the first saved, naming no other document, runs on the bundled
+  // example as the first did, rather than on no documents at all.
+  ASSERT_EQ(Run("locate --user-data @example.xml --save --sync -q --output @out.xml").first,
+            kExitOk);
+  EXPECT_EQ(Run("locate --user-data @example.xml --sync -q --output @out.xml").first, kExitOk);
 }
 
 // An application found and saved on a run over folders is watched from then on: once its folder is
