@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Builds the libFuzzer targets of fuzz/ (clang, address and undefined-behaviour sanitizers) in
-# their own build folder and runs each for SECONDS, from the seeds fuzz/make_seeds.sh writes and the
-# corpus earlier runs grew.
+# their own build folder and runs each for SECONDS, from the starting inputs that
+# fuzz/make_starters.sh writes and the corpus earlier runs grew.
 #
 # usage: bench/fuzz.sh [SECONDS] [BUILD_DIR]
 #   SECONDS    run time of each target (default: 60)
@@ -39,10 +39,10 @@ if ! log=$(nice cmake --build "$build_dir" --target trl_fuzzers -- --quiet 2>&1)
   exit 1
 fi
 
-seeds=$build_dir/fuzz-seeds
+starters=$build_dir/fuzz-starters
 findings=$build_dir/fuzz-findings
 logs=$build_dir/fuzz-logs
-"$here/fuzz/make_seeds.sh" "$seeds"
+"$here/fuzz/make_starters.sh" "$starters"
 mkdir -p "$findings" "$logs"
 # The file-system targets make their tree under TMPDIR, which a crashed run leaves behind.
 export TMPDIR=$build_dir/fuzz-tmp
@@ -59,11 +59,11 @@ for target in $targets; do
   options=(-max_total_time="$seconds" -timeout=10 -rss_limit_mb=2048 -print_final_stats=1
            -artifact_prefix="$findings/$target-")
   case $target in
-    xml_load | search | compare | filter | merge) options+=(-dict="$seeds/documents.dict") ;;
+    xml_load | search | compare | filter | merge) options+=(-dict="$starters/documents.dict") ;;
   esac
   before=$(date +%s)
-  # New inputs go to the first folder: the corpus, not the seeds.
-  if nice "$build_dir/fuzz/${target}_fuzzer" "${options[@]}" "$corpus" "$seeds/$target" \
+  # New inputs go to the first folder: the corpus, not the starting inputs.
+  if nice "$build_dir/fuzz/${target}_fuzzer" "${options[@]}" "$corpus" "$starters/$target" \
     >"$log" 2>&1; then
     result="nothing found"
   else

@@ -2,7 +2,7 @@
 """Counts the small faults in src/ that the test suite catches.
 
 Each mutant is one edit to one line of src/**/*.cpp: a flipped comparison or logical operator, a
-changed constant, or a deleted statement. Mutants are drawn in an order fixed by --seed; each is
+changed constant, or a deleted statement. Mutants are drawn in an order fixed by --order; each is
 applied to a scratch copy of the tree, built incrementally and tested, then reverted. The tree
 given is never touched.
 
@@ -154,8 +154,8 @@ def ReadSample(path):
     return mutants
 
 
-def WriteSample(path, mutants, seed):
-    rows = [f"# mutation sample, seed {seed}: id file line kind col orig repl text (tab-separated)"]
+def WriteSample(path, mutants, order):
+    rows = [f"# mutation sample, order {order}: id file line kind col orig repl text (tab-separated)"]
     for m in mutants:
         fields = (m.id, m.file, m.line, m.kind, m.col, m.orig, m.repl, m.text)
         rows.append("\t".join(map(str, fields)))
@@ -267,7 +267,7 @@ def main():
     p.add_argument("--work", type=Path, help="scratch folder (default /tmp/trl-mutation-<tree>)")
     p.add_argument("--only", help="limit mutants to src paths matching this glob")
     p.add_argument("--count", type=int, default=100, help="mutants that compile (default 100)")
-    p.add_argument("--seed", type=int, default=20240611, help="draw order (default 20240611)")
+    p.add_argument("--order", type=int, default=20240611, help="draw order (default 20240611)")
     p.add_argument("--jobs", type=int, default=2, help="build and test jobs (default 2)")
     g = p.add_mutually_exclusive_group()
     g.add_argument("--save-sample", type=Path, help="write the drawn mutants here")
@@ -281,10 +281,10 @@ def main():
         mutants = mutants[:a.count]
     else:
         mutants = Candidates(tree, a.only)
-        random.Random(a.seed).shuffle(mutants)
+        random.Random(a.order).shuffle(mutants)
         for i, m in enumerate(mutants, 1):
             m.id = i
-    drawn = f"sample {a.sample.resolve()}" if a.sample else f"seed {a.seed}"
+    drawn = f"sample {a.sample.resolve()}" if a.sample else f"order {a.order}"
     print(f"# tree {tree}, tests from {(a.tests_from or tree).resolve()}, {drawn}", flush=True)
     start = time.monotonic()
     scratch = Scratch(tree, a.tests_from and a.tests_from.resolve(), work, a.jobs)
@@ -302,7 +302,7 @@ def main():
         if outcome not in ("no-compile", "gone"):
             kept.append(m)
             if a.save_sample:
-                WriteSample(a.save_sample, kept, a.seed)
+                WriteSample(a.save_sample, kept, a.order)
         took = f" ({seconds[-1]:.1f}s)" if outcome != "gone" else ""
         print(f"{m.Describe()} {outcome}{took}", flush=True)
 

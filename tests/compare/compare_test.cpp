@@ -365,9 +365,9 @@ std::string WithoutReasons(const std::string& results) {
   return document->Xml();
 }
 
-// A fingerprint and a local-files document drawn from `seed`.
-std::pair<std::string, std::string> Draw(uint32_t seed) {
-  std::mt19937 rng(seed);
+// A fingerprint and a local-files document drawn from `draw`.
+std::pair<std::string, std::string> Draw(uint32_t draw) {
+  std::mt19937 rng(draw);
   auto below = [&](int n) { return static_cast<int>(rng() % static_cast<uint32_t>(n)); };
   // Absent, empty or one of two numbers, the one also written otherwise: ids go missing and
   // repeat.
@@ -414,14 +414,14 @@ std::pair<std::string, std::string> Draw(uint32_t seed) {
 
 TEST_F(CompareTest, DraftedCopiesGiveTheResultsOfCopiesMadeAtEveryFind) {
   int found = 0, empty = 0, takenBack = 0;
-  for (uint32_t seed = 1; seed <= 3000; ++seed) {
-    auto [fingerprint, localFiles] = Draw(seed);
+  for (uint32_t draw = 1; draw <= 3000; ++draw) {
+    auto [fingerprint, localFiles] = Draw(draw);
     std::string literal = Timeless(Run(fingerprint, localFiles, false));
-    ASSERT_EQ(Timeless(Run(fingerprint, localFiles, true)), literal) << "seed " << seed << "\n"
+    ASSERT_EQ(Timeless(Run(fingerprint, localFiles, true)), literal) << "draw " << draw << "\n"
                                                                      << fingerprint << "\n"
                                                                      << localFiles;
     std::string explained = Run(fingerprint, localFiles, true, nullptr, true);
-    ASSERT_EQ(Timeless(WithoutReasons(explained)), literal) << "seed " << seed;
+    ASSERT_EQ(Timeless(WithoutReasons(explained)), literal) << "draw " << draw;
     takenBack += explained.find("<taken_back") != std::string::npos;
     ++(literal.find("<v ") != std::string::npos ? found : empty);
   }

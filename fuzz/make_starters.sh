@@ -1,18 +1,18 @@
 #!/usr/bin/env bash
-# Writes the seed inputs of every fuzz target, one folder per target, and a dictionary of the
+# Writes the starting inputs of every fuzz target, one folder per target, and a dictionary of the
 # documents' element and attribute names, from the examples, the PE fixtures of the tests and small
 # documents of each kind below. Documents of one input are separated by a line "===", and "{root}"
 # names the small tree the search and compare targets walk.
-# Usage: fuzz/make_seeds.sh OUT-DIR
+# Usage: fuzz/make_starters.sh OUT-DIR
 set -euo pipefail
 
 here="$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)"
-out="${1:?usage: make_seeds.sh OUT-DIR}"
+out="${1:?usage: make_starters.sh OUT-DIR}"
 rm -rf "$out"
 mkdir -p "$out"
 
-# seed TARGET NAME PART...: one input of TARGET, its parts joined by separator lines.
-seed() {
+# starter TARGET NAME PART...: one input of TARGET, its parts joined by separator lines.
+starter() {
   local target="$1" name="$2"
   shift 2
   mkdir -p "$out/$target"
@@ -44,25 +44,25 @@ filtered='<trl_applicationdata><c c_id="1" c_text="localhost" c_name="localhost"
 user_data='<trl_applicationdata a_update_q="1" a_dupes_q="0"><c c_id="1" c_text="localhost" c_name="localhost" c_local="1"><m m_id="1" m_text="" m_name=""><d d_id="1" d_text="\app\" d_name="\app\"><a a_id="1" a_name="Tool" a_max_seq="2" a_manage="1" v_id="1" v_name="1.0" v_seq="1" a_guid="c1m1d1a1" a_update_q="1" a_dupes_q="1"><v v_id="1" v_name="1.0" v_seq="1"/><v_history><v v_id="0" v_name="0.9" v_seq="0" v_updated="2024-01-02 03:04:05" v_update_q="1"/></v_history></a></d><d d_id="2" d_text="\gone\" d_name="\gone\"><a a_id="2" a_name="Plugin" a_manage="1" v_id="1" v_name="1" v_seq="1" a_guid="c1m1d2a2"/></d></m></c><a_missing><a a_id="3" a_name="Old" a_manage="0" a_guid="c1m1d3a3" a_missing="1"/></a_missing></trl_applicationdata>'
 merge_options='<trl_searchoptions><c c_id="1" c_text="localhost" c_name="localhost" c_local="1"><m m_id="1" m_text="" m_name=""><d d_id="1" d_text="\app\" d_name="\app\" d_search="1"><a a_id="1" a_manage="1"/></d><d d_id="2" d_text="\gone\" d_name="\gone\" d_search="1"><a a_id="2" a_manage="1"/></d></m></c></trl_searchoptions>'
 
-seed search options "$search_options"
-seed search probe "$search_options" "$application_options" "$fingerprint"
-seed search add-to "$search_options" "" "" "$local_files"
-seed search remote "$remote_options"
-seed search example "$(sed 's#d_text="[^"]*"#d_text="{root}\\app\\"#' "$here/examples/search-options.xml")" \
+starter search options "$search_options"
+starter search probe "$search_options" "$application_options" "$fingerprint"
+starter search add-to "$search_options" "" "" "$local_files"
+starter search remote "$remote_options"
+starter search example "$(sed 's#d_text="[^"]*"#d_text="{root}\\app\\"#' "$here/examples/search-options.xml")" \
   "$(cat "$here/examples/application-options.xml")"
 
-seed compare tree "$application_options" "$local_files" "$fingerprint"
-seed compare unselected "" "$local_files" "$fingerprint"
-seed compare example "$(cat "$here/examples/application-options.xml")" "$local_files" \
+starter compare tree "$application_options" "$local_files" "$fingerprint"
+starter compare unselected "" "$local_files" "$fingerprint"
+starter compare example "$(cat "$here/examples/application-options.xml")" "$local_files" \
   "$(cat "$here/examples/fingerprint.xml")"
 
 for options in 0 1 2 4 8 16 32 63; do
-  seed filter "options-$options" "$options" "$matches"
+  starter filter "options-$options" "$options" "$matches"
 done
 
-seed merge into-user-data "$merge_options" "$application_options" "$user_data" "$filtered"
-seed merge first-run "$merge_options" "" "<trl_applicationdata/>" "$matches"
-seed merge nothing-new "$merge_options" "$application_options" "$user_data" \
+starter merge into-user-data "$merge_options" "$application_options" "$user_data" "$filtered"
+starter merge first-run "$merge_options" "" "<trl_applicationdata/>" "$matches"
+starter merge nothing-new "$merge_options" "$application_options" "$user_data" \
   "<trl_applicationdata/>"
 
 mkdir -p "$out/xml_load"
@@ -82,12 +82,12 @@ done
 names=("README.md" "Straße İstanbul ǅ" "100%'s \"quoted\"" $'tab\there' $'\xff\xfe not UTF-8'
        'C:\Program Files\App\' $'\xef\x9c\x80 private use')
 for i in "${!names[@]}"; do
-  seed name_encoding "name-$i" "${names[$i]}"
+  starter name_encoding "name-$i" "${names[$i]}"
 done
 
 for text in all 63 0 low-weights,missing-files low-file-count,duplicate-matches \
   flag-unknowns,flag-unmanaged; do
-  seed filter_names "$text" "$text"
+  starter filter_names "$text" "$text"
 done
 
 # The dictionary: every name of the document vocabulary as a tag and as an attribute, and the
