@@ -89,9 +89,8 @@ std::function<int()> AddExplainCommand(CLI::App& app) {
                       "Fingerprint database, to name the properties behind each file's score");
   command
       ->add_option("--filter", options->filter,
-                   "The rules to replay on the matches, as locate takes them: a number 0-63, or "
-                   "a comma list of low-weights, missing-files, low-file-count, "
-                   "duplicate-matches, flag-unknowns, flag-unmanaged, or all")
+                   "The rules to replay on the matches, as locate takes them: " +
+                       std::string(kFilterOptionsForm))
       ->capture_default_str();
   command->add_option("--app", options->application,
                       "Only this application: its name (any case) or its id");

@@ -8,22 +8,13 @@
 #include <unordered_map>
 #include <utility>
 
+#include "attribute_text.h"
 #include "filter_replay.h"
 #include "frame/vocabulary.h"
 #include "native_path.h"
 
 namespace trl::cli {
 namespace {
-
-constexpr std::string_view kUnidentified = "-1";
-
-std::string Attribute(const xml::Node& node, std::string_view name) {
-  return node.GetAttribute(name).value_or("");
-}
-
-int64_t Number(const xml::Node& node, std::string_view name) {
-  return std::strtoll(Attribute(node, name).c_str(), nullptr, 10);
-}
 
 // The applications filed under the root's computers, drives and folders, in document order. The
 // filter never adds or takes out an application, so the n-th is the same one in every copy.
@@ -43,8 +34,8 @@ std::vector<xml::Node> Applications(xml::Document& document) {
 
 // A version's own id: the one it had before a rule relabelled it "-1".
 std::string OwnId(const xml::Node& v) {
-  std::string id = Attribute(v, vocab::v_id);
-  return id == kUnidentified ? Attribute(v, vocab::v_guess) : id;
+  std::string id = AttributeText(v, vocab::v_id);
+  return id == kUnidentifiedVersion ? AttributeText(v, vocab::v_guess) : id;
 }
 
 std::map<std::string, xml::Node> VersionsById(const xml::Node& a) {
@@ -60,10 +51,10 @@ class FingerprintFacts {
     if (fingerprint == nullptr) return;
     for (xml::Node a : fingerprint->AsNode().GetElementsByTagName(vocab::a)) {
       for (xml::Node v : a.ChildElements(vocab::v)) {
-        std::string version = Attribute(a, vocab::a_id) + "\n" + Attribute(v, vocab::v_id);
-        names_.emplace(version, Attribute(v, vocab::v_name));
+        std::string version = AttributeText(a, vocab::a_id) + "\n" + AttributeText(v, vocab::v_id);
+        names_.emplace(version, AttributeText(v, vocab::v_name));
         for (xml::Node f : v.ChildElements(vocab::f)) {
-          properties_.emplace(version + "\n" + Attribute(f, vocab::f_id),
+          properties_.emplace(version + "\n" + AttributeText(f, vocab::f_id),
                               f.ChildElements(vocab::p));
         }
       }
@@ -85,27 +76,27 @@ class FingerprintFacts {
 
 FileExplanation ExplainFile(const xml::Node& f, const std::vector<xml::Node>* properties) {
   FileExplanation file;
-  file.id = Attribute(f, vocab::f_id);
-  file.name = Attribute(f, vocab::f_name);
-  file.weight = Number(f, vocab::f_weight);
-  file.found = Attribute(f, vocab::f_exists) == "1";
+  file.id = AttributeText(f, vocab::f_id);
+  file.name = AttributeText(f, vocab::f_name);
+  file.weight = AttributeNumber(f, vocab::f_weight);
+  file.found = AttributeText(f, vocab::f_exists) == "1";
   if (!file.found) return file;
-  file.propertiesScored = Number(f, vocab::p_act);
-  file.propertiesMax = Number(f, vocab::p_max);
+  file.propertiesScored = AttributeNumber(f, vocab::p_act);
+  file.propertiesMax = AttributeNumber(f, vocab::p_max);
   for (xml::Node p : f.ChildElements(vocab::p_local)) {
-    file.disagreed.push_back({static_cast<int>(Number(p, vocab::p_type)),
+    file.disagreed.push_back({static_cast<int>(AttributeNumber(p, vocab::p_type)),
                               p.GetAttribute(vocab::p_expected), p.GetAttribute(vocab::p_value)});
   }
   if (!file.disagreed.empty() || properties == nullptr) return file;
   // Without the run's record, the weights tell which properties the score lacks: a property of
   // weight w counts 2^(w-1).
   for (const xml::Node& p : *properties) {
-    int64_t weight = Number(p, vocab::p_weight);
+    int64_t weight = AttributeNumber(p, vocab::p_weight);
     if (weight < 1 || weight > 15 || (file.propertiesScored & (int64_t{1} << (weight - 1))) != 0) {
       continue;
     }
     file.disagreed.push_back(
-        {static_cast<int>(Number(p, vocab::p_type)), p.GetAttribute(vocab::p_value), {}});
+        {static_cast<int>(AttributeNumber(p, vocab::p_type)), p.GetAttribute(vocab::p_value), {}});
   }
   return file;
 }
@@ -115,9 +106,9 @@ VersionExplanation ExplainVersion(const std::string& applicationId, const xml::N
   VersionExplanation version;
   version.id = OwnId(v);
   std::string key = applicationId + "\n" + version.id;
-  version.name = Attribute(v, vocab::v_name);
-  version.seq = Attribute(v, vocab::v_seq);
-  if (Attribute(v, vocab::v_id) == kUnidentified) {
+  version.name = AttributeText(v, vocab::v_name);
+  version.seq = AttributeText(v, vocab::v_seq);
+  if (AttributeText(v, vocab::v_id) == kUnidentifiedVersion) {
     version.label = version.name;
     version.name = fingerprint.Name(key);
   }
@@ -125,13 +116,13 @@ VersionExplanation ExplainVersion(const std::string& applicationId, const xml::N
   if (auto weight = v.GetAttribute(vocab::v_weight)) {
     version.weight = std::strtod(weight->c_str(), nullptr);
   }
-  version.score = Number(v, vocab::v_act);
-  version.maxScore = Number(v, vocab::v_max);
-  version.filesFound = Number(v, vocab::f_act);
-  version.filesExpected = Number(v, vocab::f_max);
+  version.score = AttributeNumber(v, vocab::v_act);
+  version.maxScore = AttributeNumber(v, vocab::v_max);
+  version.filesFound = AttributeNumber(v, vocab::f_act);
+  version.filesExpected = AttributeNumber(v, vocab::f_max);
   for (xml::Node f : v.ChildElements(vocab::f)) {
     version.files.push_back(
-        ExplainFile(f, fingerprint.Properties(key + "\n" + Attribute(f, vocab::f_id))));
+        ExplainFile(f, fingerprint.Properties(key + "\n" + AttributeText(f, vocab::f_id))));
   }
   return version;
 }
@@ -148,18 +139,19 @@ ApplicationExplanation Describe(const xml::Node& a) {
   xml::Node m = d.ParentNode();
   xml::Node c = m.ParentNode();
   ApplicationExplanation app;
-  app.computer = Attribute(c, vocab::c_text);
-  app.local = Attribute(c, vocab::c_local) == "1";
-  app.folder = Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text), app.local);
-  app.applicationId = Attribute(a, vocab::a_id);
-  app.application = Attribute(a, vocab::a_name);
-  app.versionId = Attribute(a, vocab::v_id);
-  app.versionName = Attribute(a, vocab::v_name);
-  app.versionSeq = Attribute(a, vocab::v_seq);
+  app.computer = AttributeText(c, vocab::c_text);
+  app.local = AttributeText(c, vocab::c_local) == "1";
+  app.folder =
+      Readable(AttributeText(m, vocab::m_text) + AttributeText(d, vocab::d_text), app.local);
+  app.applicationId = AttributeText(a, vocab::a_id);
+  app.application = AttributeText(a, vocab::a_name);
+  app.versionId = AttributeText(a, vocab::v_id);
+  app.versionName = AttributeText(a, vocab::v_name);
+  app.versionSeq = AttributeText(a, vocab::v_seq);
   app.verdict = app.versionId.empty() || app.versionId == "0" ? "no match"
-                : app.versionId == kUnidentified              ? "unidentified"
+                : app.versionId == kUnidentifiedVersion       ? "unidentified"
                                                               : "identified";
-  app.managed = Attribute(a, vocab::a_manage) == "1";
+  app.managed = AttributeText(a, vocab::a_manage) == "1";
   return app;
 }
 
@@ -218,8 +210,8 @@ void TellStep(const xml::Node& before, const xml::Node& after, const std::string
   for (VersionExplanation& version : app.versions) {
     auto old = was.find(version.id), now = is.find(version.id);
     if (old == was.end() || now == is.end()) continue;
-    std::string name = Attribute(now->second, vocab::v_name);
-    if (name == Attribute(old->second, vocab::v_name)) continue;
+    std::string name = AttributeText(now->second, vocab::v_name);
+    if (name == AttributeText(old->second, vocab::v_name)) continue;
     version.label = name;
     version.labelRule = rule;
     version.labelReason = LabelReason(rule, version);
@@ -232,7 +224,7 @@ void TellStep(const xml::Node& before, const xml::Node& after, const std::string
     version.reason = RemovalReason(rule, version, best, kept);
   }
   // Every run of the filter starts each application manageable, and only the last rule unmarks.
-  if (Attribute(after, vocab::a_manage) != "0") return;
+  if (AttributeText(after, vocab::a_manage) != "0") return;
   app.unmanagedRule = rule;
   for (const VersionExplanation& version : app.versions) {
     if (!is.contains(version.id) || version.filesFound == version.filesExpected) continue;
@@ -249,18 +241,19 @@ void AddTakenBack(xml::Document& matches, const FingerprintFacts& fingerprint,
   xml::Node root = matches.DocumentElement();
   if (!root) return;
   for (xml::Node kept : root.ChildElements(vocab::taken_back)) {
-    std::string id = Attribute(kept, vocab::a_id);
-    std::string place = Attribute(kept, vocab::c_text) + "\n" + Attribute(kept, vocab::m_text) +
-                        "\n" + Attribute(kept, vocab::d_text) + "\n" + id;
+    std::string id = AttributeText(kept, vocab::a_id);
+    std::string place = AttributeText(kept, vocab::c_text) + "\n" +
+                        AttributeText(kept, vocab::m_text) + "\n" +
+                        AttributeText(kept, vocab::d_text) + "\n" + id;
     auto [at, added] = byPlace.try_emplace(place, explanation.applications.size());
     if (added) {
       ApplicationExplanation& app = explanation.applications.emplace_back();
-      app.computer = Attribute(kept, vocab::c_text);
-      app.local = Attribute(kept, vocab::c_local) == "1";
-      app.folder =
-          Readable(Attribute(kept, vocab::m_text) + Attribute(kept, vocab::d_text), app.local);
+      app.computer = AttributeText(kept, vocab::c_text);
+      app.local = AttributeText(kept, vocab::c_local) == "1";
+      app.folder = Readable(AttributeText(kept, vocab::m_text) + AttributeText(kept, vocab::d_text),
+                            app.local);
       app.applicationId = id;
-      app.application = Attribute(kept, vocab::a_name);
+      app.application = AttributeText(kept, vocab::a_name);
       app.verdict = "not found";
     }
     for (xml::Node v : kept.ChildElements(vocab::v)) {
@@ -298,8 +291,8 @@ Explanation ExplainMatches(const xml::Document& matches, int16_t filterOptions,
       TellStep(steps[step - 1][i], steps[step][i], replay.Rule(step), best, app);
     }
     xml::Node d = weighed.ParentNode(), m = d.ParentNode(), c = m.ParentNode();
-    byPlace.emplace(Attribute(c, vocab::c_text) + "\n" + Attribute(m, vocab::m_text) + "\n" +
-                        Attribute(d, vocab::d_text) + "\n" + app.applicationId,
+    byPlace.emplace(AttributeText(c, vocab::c_text) + "\n" + AttributeText(m, vocab::m_text) +
+                        "\n" + AttributeText(d, vocab::d_text) + "\n" + app.applicationId,
                     explanation.applications.size());
     explanation.applications.push_back(std::move(app));
   }

@@ -36,9 +36,7 @@ std::function<int()> AddFilterCommand(CLI::App& app) {
       "filter", "Reduce each matched application to the versions the filter rules let stand");
   command
       ->add_option("--filter", options->filter,
-                   "The rules to apply: a number from 0 to 63, or a comma list of low-weights, "
-                   "missing-files, low-file-count, duplicate-matches, flag-unknowns, "
-                   "flag-unmanaged, or all")
+                   "The rules to apply: " + std::string(kFilterOptionsForm))
       ->required();
   command->add_option("--matches", options->matches, "Matches document of a compare")->required();
   AddOutputOption(*command, options->stage);

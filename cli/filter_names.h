@@ -13,6 +13,11 @@ namespace trl::cli {
 // and all. Anything else is a CommandError.
 int16_t ParseFilterOptions(std::string_view text);
 
+// How the filter options are written, for the help of each option that takes them.
+inline constexpr std::string_view kFilterOptionsForm =
+    "a number from 0 to 63, or a comma list of low-weights, missing-files, low-file-count, "
+    "duplicate-matches, flag-unknowns, flag-unmanaged, or all";
+
 // The rules in the order the filter applies them.
 inline constexpr std::array<int16_t, 6> kFilterOrder{LowWeights,       MissingFiles, LowFileCount,
                                                      DuplicateMatches, FlagUnknowns, FlagUnmanaged};

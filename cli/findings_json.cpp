@@ -1,8 +1,8 @@
 #include "findings_json.h"
 
-#include <cstdlib>
 #include <nlohmann/json.hpp>
 
+#include "attribute_text.h"
 #include "frame/vocabulary.h"
 #include "reporter/reporter.h"
 
@@ -46,8 +46,8 @@ std::string FindingsJson(const std::vector<Finding>& findings, xml::Document* re
   json events = json::array();
   if (results != nullptr) {
     for (const xml::Node& e : results->AsNode().SelectNodes("/*/events/event")) {
-      auto text = [&](std::string_view name) { return e.GetAttribute(name).value_or(""); };
-      events.push_back({{"number", std::strtoll(text("number").c_str(), nullptr, 10)},
+      auto text = [&](std::string_view name) { return AttributeText(e, name); };
+      events.push_back({{"number", AttributeNumber(e, "number")},
                         {"kind", KindName(text("kind"))},
                         {"source", text("source")},
                         {"class", text("class")},

@@ -9,18 +9,13 @@
 #include <tuple>
 #include <unordered_map>
 
+#include "attribute_text.h"
 #include "frame/vocabulary.h"
 #include "native_path.h"
 #include "terminal_text.h"
 
 namespace trl::cli {
 namespace {
-
-constexpr std::string_view kUnidentified = "-1";
-
-std::string Attribute(const xml::Node& node, std::string_view name) {
-  return node.GetAttribute(name).value_or("");
-}
 
 // Folders are kept with "\" separators; a person on this system reads "/", and on this computer
 // the folder's names as the disk spells them.
@@ -47,8 +42,9 @@ void ForEachApplication(
 }
 
 std::string Key(const xml::Node& c, const xml::Node& m, const xml::Node& d, const xml::Node& a) {
-  return fmt::format("{}\n{}\n{}\n{}", Attribute(c, vocab::c_name), Attribute(m, vocab::m_name),
-                     Attribute(d, vocab::d_name), Attribute(a, vocab::a_id));
+  return fmt::format("{}\n{}\n{}\n{}", AttributeText(c, vocab::c_name),
+                     AttributeText(m, vocab::m_name), AttributeText(d, vocab::d_name),
+                     AttributeText(a, vocab::a_id));
 }
 
 size_t MissingCount(xml::Document& document) {
@@ -61,13 +57,6 @@ size_t MissingCount(xml::Document& document) {
   return count;
 }
 
-int64_t Number(const xml::Node& node, std::string_view name) {
-  std::string text = Attribute(node, name);
-  char* end = nullptr;
-  long long value = std::strtoll(text.c_str(), &end, 10);
-  return end != text.c_str() && *end == '\0' ? value : 0;
-}
-
 // What the fingerprint tells of the versions: their names, for naming best guesses, and the
 // types of each file's properties by the bit of its weight, for telling which kinds of evidence
 // agreed.
@@ -75,14 +64,15 @@ class VersionNames {
  public:
   explicit VersionNames(xml::Document& fingerprint) {
     for (xml::Node a : fingerprint.AsNode().GetElementsByTagName(vocab::a)) {
-      std::string application = Attribute(a, vocab::a_id);
+      std::string application = AttributeText(a, vocab::a_id);
       for (xml::Node v : a.ChildElements(vocab::v)) {
-        std::string version = application + "\n" + Attribute(v, vocab::v_id);
-        names_.emplace(version, Attribute(v, vocab::v_name));
+        std::string version = application + "\n" + AttributeText(v, vocab::v_id);
+        names_.emplace(version, AttributeText(v, vocab::v_name));
         for (xml::Node f : v.ChildElements(vocab::f)) {
-          auto& types = types_[version + "\n" + Attribute(f, vocab::f_id)];
+          auto& types = types_[version + "\n" + AttributeText(f, vocab::f_id)];
           for (xml::Node p : f.ChildElements(vocab::p)) {
-            int64_t weight = Number(p, vocab::p_weight), type = Number(p, vocab::p_type);
+            int64_t weight = AttributeNumber(p, vocab::p_weight),
+                    type = AttributeNumber(p, vocab::p_type);
             if (weight >= 1 && weight <= 15 && type >= 1 && type <= 4) {
               types.emplace_back(unsigned{1} << (weight - 1), unsigned{1} << (type - 1));
             }
@@ -110,63 +100,64 @@ class VersionNames {
 };
 
 std::string VersionText(const xml::Node& a, const VersionNames& names) {
-  std::string id = Attribute(a, vocab::v_id);
+  std::string id = AttributeText(a, vocab::v_id);
   if (id == "0") return "no version matched";
-  if (id != kUnidentified) return Attribute(a, vocab::v_name);
+  if (id != kUnidentifiedVersion) return AttributeText(a, vocab::v_name);
   std::string guess;
   for (xml::Node v : a.ChildElements(vocab::v)) {
-    guess = Attribute(v, vocab::v_guess);
+    guess = AttributeText(v, vocab::v_guess);
     if (!guess.empty()) break;
   }
   if (guess.empty()) return "unidentified";
-  return "unidentified (best guess " + names.Of(Attribute(a, vocab::a_id), guess) + ")";
+  return "unidentified (best guess " + names.Of(AttributeText(a, vocab::a_id), guess) + ")";
 }
 
 // Fills the parts of `finding` that `a` (an application of the merged user data) tells: the
 // verdict, the version or best guess, and the score of the version that decided it.
 void Describe(const xml::Node& a, const VersionNames& names, Finding& finding) {
-  finding.managed = Attribute(a, vocab::a_manage) == "1";
-  std::string id = Attribute(a, vocab::v_id);
+  finding.managed = AttributeText(a, vocab::a_manage) == "1";
+  std::string id = AttributeText(a, vocab::v_id);
   // As the filter wrote them: "-1" with "Multiple Matches" or "Unsupported Version" when several
   // versions were left.
   finding.versionId = id;
-  finding.versionName = Attribute(a, vocab::v_name);
-  finding.versionSeq = Attribute(a, vocab::v_seq);
+  finding.versionName = AttributeText(a, vocab::v_name);
+  finding.versionSeq = AttributeText(a, vocab::v_seq);
   xml::Node decided;
-  if (id != kUnidentified && id != "0") {
+  if (id != kUnidentifiedVersion && id != "0") {
     finding.verdict = "identified";
     for (xml::Node v : a.ChildElements(vocab::v)) {
-      if (Attribute(v, vocab::v_id) == id) decided = v;
+      if (AttributeText(v, vocab::v_id) == id) decided = v;
     }
   } else {
     finding.verdict = id == "0" ? "no match" : "unidentified";
     for (xml::Node v : a.ChildElements(vocab::v)) {
-      if (finding.guessId.empty()) finding.guessId = Attribute(v, vocab::v_guess);
+      if (finding.guessId.empty()) finding.guessId = AttributeText(v, vocab::v_guess);
     }
     if (!finding.guessId.empty()) {
-      finding.guessName = names.Of(Attribute(a, vocab::a_id), finding.guessId);
+      finding.guessName = names.Of(AttributeText(a, vocab::a_id), finding.guessId);
     }
     // The version that came closest stands for the score: the guess when it is among them.
     double best = -1;
     for (xml::Node v : a.ChildElements(vocab::v)) {
-      double most = static_cast<double>(std::max<int64_t>(Number(v, vocab::v_max), 1));
-      double share = static_cast<double>(Number(v, vocab::v_act)) / most;
-      if (Attribute(v, vocab::v_id) == finding.guessId) share += 2;
+      double most = static_cast<double>(std::max<int64_t>(AttributeNumber(v, vocab::v_max), 1));
+      double share = static_cast<double>(AttributeNumber(v, vocab::v_act)) / most;
+      if (AttributeText(v, vocab::v_id) == finding.guessId) share += 2;
       if (share > best) best = share, decided = v;
     }
   }
   if (!decided) return;
-  finding.score = Number(decided, vocab::v_act);
-  finding.maxScore = Number(decided, vocab::v_max);
-  finding.filesFound = Number(decided, vocab::f_act);
-  finding.filesExpected = Number(decided, vocab::f_max);
+  finding.score = AttributeNumber(decided, vocab::v_act);
+  finding.maxScore = AttributeNumber(decided, vocab::v_max);
+  finding.filesFound = AttributeNumber(decided, vocab::f_act);
+  finding.filesExpected = AttributeNumber(decided, vocab::f_max);
   // A relabelled version keeps its own id as its guess.
-  std::string versionId = Attribute(decided, vocab::v_id);
-  if (versionId == kUnidentified) versionId = Attribute(decided, vocab::v_guess);
-  std::string version = Attribute(a, vocab::a_id) + "\n" + versionId + "\n";
+  std::string versionId = AttributeText(decided, vocab::v_id);
+  if (versionId == kUnidentifiedVersion) versionId = AttributeText(decided, vocab::v_guess);
+  std::string version = AttributeText(a, vocab::a_id) + "\n" + versionId + "\n";
   for (xml::Node f : decided.ChildElements(vocab::f)) {
-    finding.propertiesMatched |= names.TypesAgreed(version + Attribute(f, vocab::f_id),
-                                                   static_cast<unsigned>(Number(f, vocab::p_act)));
+    finding.propertiesMatched |=
+        names.TypesAgreed(version + AttributeText(f, vocab::f_id),
+                          static_cast<unsigned>(AttributeNumber(f, vocab::p_act)));
   }
 }
 
@@ -176,11 +167,12 @@ Inventory::Inventory(xml::Document& userData) : missing_(MissingCount(userData))
   ForEachApplication(userData, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
     entries_.emplace(
         Key(c, m, d, a),
-        Entry{Attribute(c, vocab::c_text),
-              Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
-                       Attribute(c, vocab::c_local) == "1"),
-              Attribute(a, vocab::a_name), Attribute(a, vocab::v_id), Attribute(a, vocab::v_name),
-              Attribute(a, vocab::a_id), Attribute(c, vocab::c_local) == "1"});
+        Entry{AttributeText(c, vocab::c_text),
+              Readable(AttributeText(m, vocab::m_text) + AttributeText(d, vocab::d_text),
+                       AttributeText(c, vocab::c_local) == "1"),
+              AttributeText(a, vocab::a_name), AttributeText(a, vocab::v_id),
+              AttributeText(a, vocab::v_name), AttributeText(a, vocab::a_id),
+              AttributeText(c, vocab::c_local) == "1"});
   });
 }
 
@@ -191,24 +183,25 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
   ForEachApplication(merged, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
     std::string key = Key(c, m, d, a);
     present.insert(key);
-    Finding finding{Attribute(c, vocab::c_text),
-                    Readable(Attribute(m, vocab::m_text) + Attribute(d, vocab::d_text),
-                             Attribute(c, vocab::c_local) == "1"),
-                    Attribute(a, vocab::a_name),
+    Finding finding{AttributeText(c, vocab::c_text),
+                    Readable(AttributeText(m, vocab::m_text) + AttributeText(d, vocab::d_text),
+                             AttributeText(c, vocab::c_local) == "1"),
+                    AttributeText(a, vocab::a_name),
                     VersionText(a, names),
                     "",
-                    Attribute(a, vocab::a_id)};
-    finding.local = Attribute(c, vocab::c_local) == "1";
+                    AttributeText(a, vocab::a_id)};
+    finding.local = AttributeText(c, vocab::c_local) == "1";
     Describe(a, names, finding);
     auto before = entries_.find(key);
-    std::string id = Attribute(a, vocab::v_id);
+    std::string id = AttributeText(a, vocab::v_id);
     if (before == entries_.end()) {
       finding.changeKind = finding.change = "new";
     } else if (before->second.versionId != id) {
-      finding.changeKind = id == kUnidentified ? "no longer identified" : "updated";
+      finding.changeKind = id == kUnidentifiedVersion ? "no longer identified" : "updated";
       finding.changedFrom = before->second.versionName;
-      finding.change = (id == kUnidentified ? "no longer identified, was " : "updated from ") +
-                       before->second.versionName;
+      finding.change =
+          (id == kUnidentifiedVersion ? "no longer identified, was " : "updated from ") +
+          before->second.versionName;
     }
     findings.push_back(std::move(finding));
   });
@@ -223,9 +216,9 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
     for (xml::Node list : root.ChildElements(vocab::a_missing_list)) {
       for (xml::Node a : list.ChildElements(vocab::a)) {
         if (seen++ >= missing_) {
-          gone.insert(Attribute(a, vocab::a_id));
+          gone.insert(AttributeText(a, vocab::a_id));
         } else {
-          listed.insert(Attribute(a, vocab::a_id));
+          listed.insert(AttributeText(a, vocab::a_id));
         }
       }
     }

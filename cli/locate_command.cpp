@@ -284,9 +284,7 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
                       "User data of earlier runs, merged with this run's findings (default: a new, "
                       "empty inventory)");
   command
-      ->add_option("--filter", options->filter,
-                   "Filter rules: a number 0-63, or a comma list of low-weights, missing-files, "
-                   "low-file-count, duplicate-matches, flag-unknowns, flag-unmanaged, or all")
+      ->add_option("--filter", options->filter, "Filter rules: " + std::string(kFilterOptionsForm))
       ->capture_default_str();
   command->add_option("--log", options->log, "Append the run log to FILE");
   AddShareOption(*command, options->stage);
