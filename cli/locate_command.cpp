@@ -245,11 +245,13 @@ int RunLocate(const LocateOptions& options) {
     if (options.shown.format != "xml") {
       xml::Document none;
       xml::Document& fingerprint = documents.fingerprint ? *documents.fingerprint : none;
+      // Only JSON carries the run's events: the results are read again for nothing else.
       xml::Document results;
-      results.LoadXml(outcome.results);
-      WriteTextOutput(RenderFindings(options.shown,
-                                     before->Changes(*documents.userData, fingerprint), &results),
-                      options.stage.output);
+      bool events = options.shown.format == "json" && results.LoadXml(outcome.results);
+      WriteTextOutput(
+          RenderFindings(options.shown, before->Changes(*documents.userData, fingerprint),
+                         events ? &results : nullptr),
+          options.stage.output);
     } else {
       WriteTextOutput(outcome.results, options.stage.output);
     }
