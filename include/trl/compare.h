@@ -21,7 +21,9 @@ class VersionFiles;
 class LocalFileRecord;
 struct CandidatePlace;
 class Schema;
+class ReadAhead;
 namespace fs {
+class File;
 class FileSystem;
 }  // namespace fs
 
@@ -53,6 +55,11 @@ class Compare : public Worker {
   // per disagreeing property with the value expected and the value the file has. Off (the
   // default): the results hold only the matches.
   void Explaining(bool on) { explaining_ = on; }
+
+  // How many threads read and hash the candidate files ahead of the match (results and reports
+  // stay the same); 0 reads each file on the run's own thread when it is tested. One per core
+  // unless set.
+  void ReadThreads(unsigned threads) { readThreads_ = threads; }
 
  protected:
   void RunBody() override;
@@ -100,6 +107,16 @@ class Compare : public Worker {
 
   // `files`: how many f the local files hold, at most what the index gets.
   void FillRecordset(size_t files);
+  // Starts reading ahead the candidates of `applications`, planned as the match will test them.
+  void StartReadAhead(const std::vector<xml::Node>& applications);
+  void StopReadAhead();
+  // Plans the reads of the next few fingerprint files; false once all are planned.
+  bool PlanMoreReads();
+  std::vector<xml::Node> PlannableFiles(const xml::Node& a) const;
+  void PlanFileReads(const xml::Node& f);
+  void PlanPathReads(const std::string& path, unsigned wanted);
+  // The value of a property of kind 1 or 3 of a tested file, read ahead or now.
+  std::string ReadLocalValue(LocalFileFacts& facts, const fs::File& file, int16_t kind);
   int16_t MatchFile(const std::string& path, const FingerprintFile& f);
   bool UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int16_t mask);
   // The same for a drafted copy, with the same reports.
@@ -169,6 +186,12 @@ class Compare : public Worker {
   std::unordered_set<const void*> knownCopies_;
   // What the run has learnt of each local file it tested, by path.
   std::unordered_map<std::string, std::unique_ptr<LocalFileFacts>> filesSeen_;
+
+  unsigned readThreads_;
+  struct ReadPlan;
+  std::unique_ptr<ReadPlan> readPlan_;
+  // Reads files of filesSeen_, so it goes first.
+  std::unique_ptr<ReadAhead> readAhead_;
 };
 
 }  // namespace trl

@@ -10,6 +10,8 @@
 #include "compare/file_facts.h"
 #include "compare/fingerprint_file.h"
 #include "compare/local_file_index.h"
+#include "compare/read_ahead.h"
+#include "compare/read_plan.h"
 #include "compare/version_draft.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
@@ -45,8 +47,8 @@ Compare::Compare() : Compare(nullptr) {
 Compare::Compare(std::unique_ptr<fs::FileSystem> fileSystem)
     : Worker(kClass, kCompareMode),
       objFSO(std::move(fileSystem)),
-      objSchema(
-          CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })) {}
+      objSchema(CreateService<Schema>("trlSchema.Data", [] { return std::make_unique<Schema>(); })),
+      readThreads_(ReadAhead::DefaultThreads()) {}
 
 Compare::~Compare() = default;
 
@@ -70,6 +72,7 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
   lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
   on([&] { UpgradeFingerprintData(*objFingerprintDOM); });
   e_a_total = e_a_count = e_match_count = 0;
+  StopReadAhead();
   rsLocalFiles.reset();
   copiesById_.clear();
   knownCopies_.clear();
@@ -94,6 +97,7 @@ void Compare::Match() {
   if (files != 0) {
     BeginRun(on);
     FillRecordset(files);
+    StartReadAhead(applications);
     for (const xml::Node& a : applications) {
       YieldIfAsynchronous(on);
       if (status_ == kStatusCancelled) break;
@@ -105,6 +109,7 @@ void Compare::Match() {
 
 void Compare::Finish() {
   OnError on{kClass, compare::kMatchLabel};
+  StopReadAhead();
   std::string endTime = FormatDateTime(Now());
   for (const xml::Node& kept : std::exchange(takenBack_, {})) {
     on([&] { objResultsDOM->DocumentElement().AppendChild(kept); });
@@ -130,6 +135,7 @@ bool Compare::MatchApplication(xml::Node a) {
   bool selected = false;
   on([&] { selected = Use(objSchema).IsApplicationSelected(a, *objApplicationOptionsDOM); });
   if (!selected) return false;
+  if (readAhead_) readAhead_->KeepAhead();
   on([&] { e_a_count = CheckedAdd(e_a_count, 1); });
   RaiseApplicationProgress(a, false);
 
@@ -375,6 +381,7 @@ void Compare::ReleaseDocuments() {
   objLocalFilesDOM.reset();
   objFingerprintDOM.reset();
   objResultsDOM.reset();
+  StopReadAhead();
   rsLocalFiles.reset();
   copiesById_.clear();
   knownCopies_.clear();

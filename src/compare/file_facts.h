@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 
+#include "compare/read_ahead.h"
 #include "platform/fs/file_system.h"
 
 namespace trl {
@@ -30,6 +31,8 @@ class Learnt {
   }
   // The value read so far, or null.
   const T* Known() const { return value_ ? &*value_ : nullptr; }
+  // Whether it was read, or failed to be.
+  bool Settled() const { return value_ || failure_; }
 
  private:
   std::optional<T> value_;
@@ -46,6 +49,8 @@ struct LocalFileFacts {
   Learnt<int32_t> size;         // kind 2
   Learnt<std::string> digest;   // kind 3, lower case
   Learnt<std::string> written;  // kind 4, formatted
+  // The reading ahead of its version and digest, until both are taken.
+  std::shared_ptr<ReadAhead::Planned> planned;
 };
 
 }  // namespace trl

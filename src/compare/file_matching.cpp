@@ -26,8 +26,10 @@ namespace {
 // Whether the file's value of the property equals the expected one, compared the way the kind's
 // values compare. Only the kind asked for is read, so a file is hashed only when a property wants
 // its digest; the local value is read before the expected one, and an unknown kind reads neither.
+// `readValue` gives the value of kind 1 or 3.
+template <class ReadValue>
 bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& schema,
-                    const fs::File* file, LocalFileFacts& facts) {
+                    const fs::File* file, LocalFileFacts& facts, ReadValue&& readValue) {
   auto local = [&](auto& learnt, auto form) -> decltype(auto) {
     return learnt.Get([&] { return form(Use(file)); });
   };
@@ -38,8 +40,8 @@ bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& sch
   };
   switch (property.kind) {
     case 1: {
-      const std::string& version = local(
-          facts.version, [&](const fs::File& f) { return LowerCase(schema.ReadPropertyType1(f)); });
+      const std::string& version =
+          local(facts.version, [&](const fs::File& f) { return LowerCase(readValue(f, 1)); });
       return version == expected().expectedText;
     }
     case 2: {
@@ -49,8 +51,8 @@ bool PropertyAgrees(const FingerprintFile::Property& property, const Schema& sch
       return size == expected().expectedNumber;
     }
     case 3: {
-      const std::string& digest = local(
-          facts.digest, [&](const fs::File& f) { return LowerCase(schema.ReadPropertyType3(f)); });
+      const std::string& digest =
+          local(facts.digest, [&](const fs::File& f) { return LowerCase(readValue(f, 3)); });
       return digest == expected().expectedText;
     }
     case 4: {
@@ -112,7 +114,11 @@ int16_t Compare::MatchFile(const std::string& path, const FingerprintFile& f) {
     for (const auto& failure : property.readFailures) FingerprintFile::Replay(on, failure);
     subject.emplace(path);
     bool agrees = false;
-    on([&] { agrees = PropertyAgrees(property, Use(objSchema), file, facts); });
+    on([&] {
+      agrees = PropertyAgrees(
+          property, Use(objSchema), file, facts,
+          [&](const fs::File& f, int16_t kind) { return ReadLocalValue(facts, f, kind); });
+    });
     if (agrees) on([&] { mask = CheckedAdd16(mask, property.bit); });
     // A property without weight does not count, so it explains nothing.
     if (explaining_ && !agrees && property.bit != 0) {

@@ -5,7 +5,9 @@
 #include <chrono>
 #include <filesystem>
 #include <map>
+#include <regex>
 
+#include "frame/error_handler.h"
 #include "platform/event_loop.h"
 #include "platform/failure.h"
 #include "schema/schema.h"
@@ -168,6 +170,76 @@ TEST_F(DiskTest, CancelStopsTheHashingOfAHugeFile) {
   ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return search.Status() >= kStatusComplete; },
                                             std::chrono::seconds(60)));
   EXPECT_EQ(search.Status(), kStatusCancelled);
+  EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(20));
+}
+
+// Reading ahead on other threads changes nothing in the results: the same scores, the same
+// failures in the same order, whatever the number of threads. Every lib.so is a candidate of every
+// application's lib.so; half the versions expect other contents; one data file became a fifo.
+TEST_F(DiskTest, ReadingAheadGivesTheResultsOfReadingInTurn) {
+  auto fileSystem = fs::CreatePosixFileSystem({});
+  std::string fingerprint = "<fp>";
+  for (int app = 0; app < 24; ++app) {
+    std::string id = std::to_string(app);
+    tree_.AddFolder("app" + id);
+    tree_.AddFile("app" + id + "/lib.so", "lib " + id);
+    tree_.AddFile("app" + id + "/data.bin", std::string(app * 1000, 'd'));
+    fingerprint += "<a a_id='" + id + "' a_name='app" + id + "'>";
+    for (int version = 1; version <= 2; ++version) {
+      auto digest = [&](const std::string& name) {
+        if (version == 2 || (app == 7 && name == "data.bin")) return std::string("00");
+        return Schema().ReadPropertyType3(
+            *fileSystem->GetFile(tree_.Path("app" + id + "/" + name)));
+      };
+      fingerprint += "<v v_id='" + std::to_string(version) + "' v_name='" +
+                     std::to_string(version) + "' v_seq='" + std::to_string(version) + "'>";
+      int fileId = 0;
+      for (const std::string name : {"lib.so", "data.bin"}) {
+        fingerprint += "<f f_id='" + std::to_string(++fileId) + "' f_name='" + name +
+                       "' f_relpath='' f_weight='1'><p p_type='1' p_weight='1' p_value=''/>"
+                       "<p p_type='3' p_weight='2' p_value='" +
+                       digest(name) + "'/></f>";
+      }
+      fingerprint += "</v>";
+    }
+    fingerprint += "</a>";
+  }
+  fingerprint += "</fp>";
+  auto local = Run(LocalOptions(tree_.Path(), "d_search='1'"));
+  std::filesystem::remove(tree_.Native("app7/data.bin"));
+  tree_.AddFifo("app7/data.bin");
+
+  auto results = [&](unsigned threads) {
+    Compare compare(fs::CreatePosixFileSystem({}));
+    compare.Asynchronous(false);
+    compare.ReadThreads(threads);
+    std::string text = compare.Start(nullptr, local, Parse(fingerprint));
+    ReleaseSharedReporter();
+    return std::regex_replace(text, std::regex(R"( compare_(start|end)="[^"]*")"), "");
+  };
+  std::string inTurn = results(0);
+  ASSERT_THAT(inTurn, ::testing::HasSubstr("<event"));  // the fifo's failures
+  for (unsigned threads : {1u, 3u}) EXPECT_EQ(results(threads), inTurn) << threads << " threads";
+}
+
+// A cancel reaches a compare waiting for a thread that hashes a huge file.
+TEST_F(DiskTest, CancelStopsACompareWaitingForAHugeFile) {
+  tree_.AddFile("huge");
+  std::filesystem::resize_file(tree_.Native("huge"), uintmax_t{64} << 30);  // sparse
+  auto local = Run(LocalOptions(tree_.Path(), "d_search='1'"));
+  Compare compare(fs::CreatePosixFileSystem({}));
+  compare.ReadThreads(2);
+  Timer cancel([&] { compare.Cancel(); });
+  cancel.Interval(300);  // once the run waits for the thread reading it
+  cancel.Enabled(true);
+  compare.Start(nullptr, local,
+                Parse("<fp><a a_id='1'><v v_id='1' v_seq='1'><f f_id='1' f_name='huge' "
+                      "f_relpath='' f_weight='1'><p p_type='3' p_weight='1' p_value='0'/></f>"
+                      "</v></a></fp>"));
+  auto started = std::chrono::steady_clock::now();
+  ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return compare.Status() >= kStatusComplete; },
+                                            std::chrono::seconds(60)));
+  EXPECT_EQ(compare.Status(), kStatusCancelled);
   EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(20));
 }
 

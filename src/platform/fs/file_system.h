@@ -46,6 +46,9 @@ class File {
   virtual bool HasCaseSibling() const { return false; }
   // Whether it is a link to a file rather than the file itself.
   virtual bool IsLink() const { return false; }
+  // Whether Open may be called on any thread while the file system goes on being used on the
+  // thread that made the file, so that files can be read ahead on other threads.
+  virtual bool OpensOnAnyThread() const { return false; }
 };
 
 class Folder;

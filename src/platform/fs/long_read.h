@@ -28,7 +28,7 @@ class LongReadPoll {
   friend void PollLongRead();
 };
 
-inline constexpr uint64_t kLongReadStep = uint64_t{32} << 20;
+inline constexpr uint64_t kLongReadStep = uint64_t{8} << 20;
 
 void PollLongRead();
 

@@ -28,6 +28,8 @@ class PosixFile final : public File {
   DateTime DateLastModified() const override;
   std::unique_ptr<FileReader> Open() const override;
   bool HasCaseSibling() const override { return caseSibling_; }
+  // Opening needs only the folder's native path and the name, neither of which changes.
+  bool OpensOnAnyThread() const override { return true; }
 
   const std::string& NativeName() const { return nativeName_; }
   void MarkCaseSibling() { caseSibling_ = true; }
