@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
@@ -120,9 +121,23 @@ Outcome RunSynchronously(Locate& locate, const Documents& documents, int16_t fil
 }
 
 // Runs on this thread's event loop, with live progress and Ctrl-C turned into Cancel.
+const char* StageName(int mode) {
+  static const char* const names[] = {"start", "search", "compare", "filter", "merge", "final"};
+  return mode >= 0 && mode <= Locate::kFinished ? names[mode] : "unknown";
+}
+
+std::string CancelNote(int stage, const std::string& wrote, bool save) {
+  return fmt::format("cancelled during the {} stage; {}{}", StageName(stage), wrote,
+                     save ? "; the user data was not saved" : "");
+}
+
 Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t filter,
-                          LiveProgress& progress) {
-  InterruptGuard interrupt;
+                          LiveProgress& progress, bool save, bool writesWhatItHas) {
+  // The stage as the events tell it, for the note of a run that is not waited for.
+  std::atomic<int> stage{0};
+  InterruptGuard interrupt(
+      [&] { return CancelNote(stage.load(), "nothing was written", save); },
+      writesWhatItHas ? std::nullopt : std::optional(std::chrono::milliseconds(20)));
   Outcome outcome;
   bool ended = false;
   // A Cancel reaches a stage only while it runs, so the request is repeated at every report (the
@@ -134,7 +149,9 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
     progress.Update(update);
     int mode = Attribute(update, vocab::e_mode);
     int status = Attribute(update, vocab::e_status);
+    if (mode >= 0) stage = mode;
     if (status == kStatusCancelled || (mode == Locate::kFinished && status == kStatusComplete)) {
+      InterruptGuard::Stopped();
       ended = true;
       outcome.complete = status == kStatusComplete;
       outcome.cancelled = status == kStatusCancelled;
@@ -153,7 +170,7 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
     progress.Tick();
     cancelIfAsked();
   });
-  watch.Interval(100);
+  watch.Interval(10);  // Ctrl-C becomes a Cancel soon after it
   watch.Enabled(true);
 
   locate.Start(documents.searchOptions, documents.applicationOptions, filter, documents.fingerprint,
@@ -166,11 +183,6 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
     outcome.stage = locate.Mode();
   }
   return outcome;
-}
-
-const char* StageName(int mode) {
-  static const char* const names[] = {"start", "search", "compare", "filter", "merge", "final"};
-  return mode >= 0 && mode <= Locate::kFinished ? names[mode] : "unknown";
 }
 
 int RunLocate(const LocateOptions& options) {
@@ -216,23 +228,27 @@ int RunLocate(const LocateOptions& options) {
                 FileSystemWithShares(options.stage.shares));
   locate.Asynchronous(!options.sync);
   locate.LogFile(options.log);
+  // What a cancelled stage had is written only as XML; a run that would write nothing is not
+  // waited for long after Ctrl-C.
+  bool writesWhatItHas = !options.stage.output.empty() || options.shown.format == "xml";
   Outcome outcome = options.sync ? RunSynchronously(locate, documents, filter)
-                                 : RunAsynchronously(locate, documents, filter, progress);
+                                 : RunAsynchronously(locate, documents, filter, progress,
+                                                     options.save, writesWhatItHas);
   progress.Clear();
 
   if (outcome.cancelled) {
     std::string wrote = "nothing was written";
-    if (!outcome.results.empty() &&
-        (!options.stage.output.empty() || options.shown.format == "xml")) {
+    if (!outcome.results.empty() && writesWhatItHas) {
       WriteTextOutput(outcome.results, options.stage.output);
       wrote = fmt::format(
           "what the {} stage had was written to {}", StageName(outcome.stage),
           options.stage.output.empty() ? "standard output" : "'" + options.stage.output + "'");
     }
-    fmt::print(stderr, "trllocator: cancelled during the {} stage; {}{}\n",
-               StageName(outcome.stage), wrote,
-               options.save ? "; the user data was not saved" : "");
-    return kExitInterrupted;
+    fmt::print(stderr, "trllocator: {}\n", CancelNote(outcome.stage, wrote, options.save));
+    // Nothing is left to save: ending here spares the release of the run's documents, which at
+    // scale takes longer than the cancel itself.
+    std::fflush(nullptr);
+    ::_exit(kExitInterrupted);
   }
   if (!outcome.complete || outcome.results.empty()) {
     throw CommandError("the locate run did not complete; the user data was not saved", kExitFailed);
