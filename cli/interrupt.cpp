@@ -24,6 +24,7 @@ struct sigaction previous {};
 std::mutex mutex;
 std::condition_variable changed;
 bool stopped = false;  // the run stopped, or the guard goes away
+bool quickEnd = false;
 
 void OnInterrupt(int) {
   if (interrupts.fetch_add(1) > 0) ::_exit(kExitInterrupted);
@@ -89,6 +90,14 @@ void InterruptGuard::Watch() {
   std::fwrite(message.data(), 1, message.size(), stderr);
   std::fflush(stderr);
   ::_exit(kExitInterrupted);
+}
+
+void AllowQuickEnd() { quickEnd = true; }
+
+void QuickEnd(int code) {
+  if (!quickEnd) return;
+  std::fflush(nullptr);
+  ::_exit(code);
 }
 
 }  // namespace trl::cli

@@ -247,8 +247,8 @@ int RunLocate(const LocateOptions& options) {
     fmt::print(stderr, "trllocator: {}\n", CancelNote(outcome.stage, wrote, options.save));
     // Nothing is left to save: ending here spares the release of the run's documents, which at
     // scale takes longer than the cancel itself.
-    std::fflush(nullptr);
-    ::_exit(kExitInterrupted);
+    QuickEnd(kExitInterrupted);
+    return kExitInterrupted;
   }
   if (!outcome.complete || outcome.results.empty()) {
     throw CommandError("the locate run did not complete; the user data was not saved", kExitFailed);

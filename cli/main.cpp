@@ -11,6 +11,7 @@
 #include "filter_command.h"
 #include "fingerprint_command.h"
 #include "huge_pages.h"
+#include "interrupt.h"
 #include "inventory_command.h"
 #include "locate_command.h"
 #include "manage_command.h"
@@ -22,6 +23,7 @@
 int main(int argc, char** argv) {
   using namespace trl::cli;
   StartWithHugePages(argv);
+  AllowQuickEnd();
   CLI::App app{"trllocator: finds which known applications are installed, and which version"};
   app.set_version_flag("--version", std::string("trllocator ") + TRL_VERSION);
   app.footer(

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <csignal>
 #include <filesystem>
 #include <fstream>
@@ -12,6 +13,7 @@
 #include <iterator>
 #include <map>
 #include <string>
+#include <thread>
 #include <tuple>
 #include <vector>
 
@@ -22,6 +24,7 @@
 #include "fingerprint_author.h"
 #include "fingerprint_command.h"
 #include "frame/error_handler.h"
+#include "interrupt.h"
 #include "locate_command.h"
 #include "merge_command.h"
 #include "platform/event_loop.h"
@@ -247,6 +250,22 @@ TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("inventory.xml.bak")));
   // What the search had when it stopped is written, marked as cancelled.
   EXPECT_THAT(Read("out.xml"), ::testing::HasSubstr("cancelled=\"1\""));
+}
+
+// After Ctrl-C, a run that does not stop within the grace period is not waited for, and one that
+// stops in time is left to end as it will.
+TEST(InterruptGuardTest, ARunThatDoesNotStopInTimeIsNotWaitedFor) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  auto interrupted = [](bool stops) {
+    InterruptGuard guard([] { return std::string("gave up"); }, std::chrono::milliseconds(20));
+    std::raise(SIGINT);
+    if (stops) InterruptGuard::Stopped();
+    std::this_thread::sleep_for(std::chrono::seconds(stops ? 0 : 30));
+    std::exit(InterruptGuard::Requested() ? 7 : 0);
+  };
+  EXPECT_EXIT(interrupted(false), ::testing::ExitedWithCode(kExitInterrupted),
+              "^trllocator: gave up\n$");
+  EXPECT_EXIT(interrupted(true), ::testing::ExitedWithCode(7), "^$");
 }
 
 TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
