@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <csignal>
 #include <filesystem>
 #include <fstream>
@@ -12,6 +13,7 @@
 #include <iterator>
 #include <map>
 #include <string>
+#include <thread>
 #include <tuple>
 #include <vector>
 
@@ -275,6 +277,40 @@ TEST_F(CommandsTest, FingerprintAddCreatesThenRewritesTheDatabase) {
   EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
   // Neither a backup nor a temporary file is left beside the database, only its lock file.
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Native("db")), {}), 2);
+}
+
+TEST_F(CommandsTest, TheCacheChangesNoDocumentAndASecondRunReadsNoFile) {
+  tree_.AddFile("App/lib.dll", "library");
+  ::testing::internal::CaptureStdout();
+  ASSERT_EQ(Run("fingerprint add --app-id 4 --app-name App --version-id 1 --version-name 1 --seq 1 "
+                "--folder @App --database @digests.xml --no-cache")
+                .first,
+            kExitOk);
+  ::testing::internal::GetCapturedStdout();
+  // What a locate run writes, and the property cache's line among what it prints.
+  auto locate = [&](const std::string& options) {
+    ::testing::internal::CaptureStderr();
+    Run("locate @App --fingerprint @digests.xml -v --output @out.xml " + options);
+    std::string printed = ::testing::internal::GetCapturedStderr();
+    size_t at = printed.find("trllocator: property cache:");
+    return std::make_pair(Read("out.xml"), at == std::string::npos
+                                               ? ""
+                                               : printed.substr(at, printed.find('\n', at) - at));
+  };
+  const std::string cache = "--cache @cache/properties.sqlite";
+  auto counts = [](int reused, int read, int stored) {
+    return fmt::format(
+        "trllocator: property cache: {} values reused, {} files read, {} values stored", reused,
+        read, stored);
+  };
+  // Files written a moment ago: their times cannot vouch for them yet.
+  auto [document, line] = locate(cache);
+  EXPECT_EQ(line, counts(0, 3, 0));
+  EXPECT_THAT(document, ::testing::HasSubstr("a_id=\"4\""));  // the version was found
+  std::this_thread::sleep_for(std::chrono::milliseconds(2100));
+  EXPECT_EQ(locate(cache), std::make_pair(document, counts(0, 3, 3)));
+  EXPECT_EQ(locate(cache), std::make_pair(document, counts(3, 0, 0)));
+  EXPECT_EQ(locate("--no-cache"), std::make_pair(document, std::string()));
 }
 
 // Contents are RFC 1321 test inputs, so the expected digests are the published ones.
