@@ -7,16 +7,19 @@
 #include <array>
 #include <chrono>
 #include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <iterator>
 #include <map>
+#include <optional>
 #include <string>
 #include <thread>
 #include <tuple>
 #include <vector>
 
+#include "cache_option.h"
 #include "command_error.h"
 #include "compare_command.h"
 #include "filter_command.h"
@@ -311,6 +314,33 @@ TEST_F(CommandsTest, TheCacheChangesNoDocumentAndASecondRunReadsNoFile) {
   EXPECT_EQ(locate(cache), std::make_pair(document, counts(0, 3, 3)));
   EXPECT_EQ(locate(cache), std::make_pair(document, counts(3, 0, 0)));
   EXPECT_EQ(locate("--no-cache"), std::make_pair(document, std::string()));
+}
+
+TEST(CacheFileTest, TheOptionThenXdgCacheHomeThenHome) {
+  // Options, XDG_CACHE_HOME, HOME (nullptr: not set) and the file the cache is kept in.
+  const std::tuple<CacheOptions, const char*, const char*, std::string> cases[] = {
+      {{"c.db", false}, "/xdg", "/home/u", "c.db"},
+      {{"", true}, "/xdg", "/home/u", ""},
+      {{}, "/xdg", "/home/u", "/xdg/trllocator/properties.sqlite"},
+      {{}, "xdg", "/home/u", "/home/u/.cache/trllocator/properties.sqlite"},  // must be absolute
+      {{}, nullptr, "/home/u", "/home/u/.cache/trllocator/properties.sqlite"},
+      {{}, nullptr, nullptr, ""},
+  };
+  auto set = [](const char* name, const char* value) {
+    value ? ::setenv(name, value, 1) : ::unsetenv(name);
+  };
+  auto saved = [](const char* name) {
+    const char* value = std::getenv(name);
+    return value ? std::optional<std::string>(value) : std::nullopt;
+  };
+  const std::optional<std::string> xdg = saved("XDG_CACHE_HOME"), home = saved("HOME");
+  for (const auto& [options, xdgCacheHome, homeFolder, file] : cases) {
+    set("XDG_CACHE_HOME", xdgCacheHome);
+    set("HOME", homeFolder);
+    EXPECT_EQ(CacheFile(options), file) << (xdgCacheHome ? xdgCacheHome : "-");
+  }
+  set("XDG_CACHE_HOME", xdg ? xdg->c_str() : nullptr);
+  set("HOME", home ? home->c_str() : nullptr);
 }
 
 // Contents are RFC 1321 test inputs, so the expected digests are the published ones.
