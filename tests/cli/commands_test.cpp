@@ -323,7 +323,6 @@ TEST(CacheFileTest, TheOptionThenXdgCacheHomeThenHome) {
       {{"", true}, "/xdg", "/home/u", ""},
       {{}, "/xdg", "/home/u", "/xdg/trllocator/properties.sqlite"},
       {{}, "xdg", "/home/u", "/home/u/.cache/trllocator/properties.sqlite"},  // must be absolute
-      {{}, nullptr, "/home/u", "/home/u/.cache/trllocator/properties.sqlite"},
       {{}, nullptr, nullptr, ""},
   };
   auto set = [](const char* name, const char* value) {
