@@ -23,6 +23,7 @@ build_dir="${1:-$here/build}"
 packages=(
   g++ cmake ninja-build pkg-config
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev nlohmann-json3-dev
+  libsqlite3-dev
   libgtest-dev libgmock-dev libbenchmark-dev
 )
 # The CycloneDX schema the tests validate against comes from npm.

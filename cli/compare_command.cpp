@@ -25,6 +25,7 @@ int RunCompare(const CompareOptions& options) {
   auto fingerprint = LoadDocumentFile(options.fingerprint, kFingerprintRole);
 
   ReportPrinter printer(options.stage);
+  CacheForRun cache(options.stage.cache, options.stage.quiet, options.stage.verbose);
   Compare compare(FileSystemWithShares(options.stage.shares));
   compare.Asynchronous(false);
   compare.Explaining(options.explain);
@@ -47,6 +48,7 @@ std::function<int()> AddCompareCommand(CLI::App& app) {
                     "Keep in the matches, for trllocator explain, the versions taken back for "
                     "lack of a weighted file and the values of properties that disagreed");
   AddShareOption(*command, options->stage);
+  AddCacheOptions(*command, options->stage.cache);
   AddOutputOption(*command, options->stage);
   return [command, options] { return command->parsed() ? RunCompare(*options) : -1; };
 }

@@ -11,6 +11,7 @@
 #include <string>
 
 #include "atomic_file.h"
+#include "cache_option.h"
 #include "command_error.h"
 #include "document_files.h"
 #include "fingerprint_author.h"
@@ -48,6 +49,7 @@ struct FingerprintAddOptions {
   int docWeight = 0;
   int fileWeight = 1;
   bool replace = false;
+  CacheOptions cache;
 };
 
 // The folder at a native path in the component's "\" form, names made XML-safe as the file system
@@ -81,6 +83,7 @@ int RunFingerprintAdd(const FingerprintAddOptions& options, bool appNameGiven) {
   SaveLock lock(options.database);
   xml::DocumentPtr database = LoadOrCreateDatabase(options.database);
   auto fileSystem = fs::CreatePosixFileSystem({});
+  CacheForRun cache(options.cache, false, false);
   xml::Node v;
   try {
     v = AddReferenceVersion(*database, version, *fileSystem);
@@ -132,6 +135,7 @@ std::function<int()> AddFingerprintCommand(CLI::App& app) {
   add->add_flag("--replace", options->replace,
                 "Describe a version the application already has "
                 "again instead of failing");
+  AddCacheOptions(*add, options->cache);
   std::function<int()> importDpkg = AddImportDpkgCommand(*group);
   return [add, appName, options, importDpkg] {
     return add->parsed() ? RunFingerprintAdd(*options, appName->count() > 0) : importDpkg();

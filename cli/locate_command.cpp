@@ -224,6 +224,7 @@ int RunLocate(const LocateOptions& options) {
 
   LiveProgress progress;
   ReportPrinter printer(options.stage, [&progress] { progress.Clear(); });
+  CacheForRun cache(options.stage.cache, options.stage.quiet, options.stage.verbose);
   Locate locate(FileSystemWithShares(options.stage.shares),
                 FileSystemWithShares(options.stage.shares));
   locate.Asynchronous(!options.sync);
@@ -306,6 +307,7 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
       ->capture_default_str();
   command->add_option("--log", options->log, "Append the run log to FILE");
   AddShareOption(*command, options->stage);
+  AddCacheOptions(*command, options->stage.cache);
   AddOutputOption(*command, options->stage);
   command->add_flag("--save", options->save,
                     "After a complete run, replace the --user-data file with the merged user data "

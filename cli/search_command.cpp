@@ -36,6 +36,7 @@ int RunSearch(const SearchOptions& options) {
   auto results = LoadOptionalDocumentFile(options.results, kLocalFilesRole);
 
   ReportPrinter printer(options.stage);
+  CacheForRun cache(options.stage.cache, options.stage.quiet, options.stage.verbose);
   Search search(FileSystemWithShares(options.stage.shares));
   search.Asynchronous(false);
   std::string text = search.Start(searchOptions, applicationOptions, fingerprint, results);
@@ -61,6 +62,7 @@ std::function<int()> AddSearchCommand(CLI::App& app) {
   command->add_option("--results", options->results,
                       "A local-files document to add to (its ids are continued)");
   AddShareOption(*command, options->stage);
+  AddCacheOptions(*command, options->stage.cache);
   AddOutputOption(*command, options->stage);
   return [command, options] { return command->parsed() ? RunSearch(*options) : -1; };
 }

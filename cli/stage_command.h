@@ -7,14 +7,16 @@
 #include <string_view>
 #include <vector>
 
+#include "cache_option.h"
 #include "platform/fs/file_system.h"
 
 namespace trl::cli {
 
-// What the commands that run one stage share: network share mappings, the output file, and the
-// printing of what the stage reports.
+// What the commands that run one stage share: network share mappings, the property cache, the
+// output file, and the printing of what the stage reports.
 struct StageOptions {
   std::vector<std::string> shares;  // "\\HOST\SHARE=DIR"
+  CacheOptions cache;
   std::string output;
   bool quiet = false;    // failures only
   bool verbose = false;  // every report, run-log entries included

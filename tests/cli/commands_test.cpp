@@ -7,16 +7,19 @@
 #include <array>
 #include <chrono>
 #include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <iterator>
 #include <map>
+#include <optional>
 #include <string>
 #include <thread>
 #include <tuple>
 #include <vector>
 
+#include "cache_option.h"
 #include "command_error.h"
 #include "compare_command.h"
 #include "filter_command.h"
@@ -294,6 +297,66 @@ TEST_F(CommandsTest, FingerprintAddCreatesThenRewritesTheDatabase) {
   EXPECT_EQ(testing::ValuesOf(*written, "//f", "f_weight"), (Strings{"0", "1", "0", "1"}));
   // Neither a backup nor a temporary file is left beside the database, only its lock file.
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(tree_.Native("db")), {}), 2);
+}
+
+TEST_F(CommandsTest, TheCacheChangesNoDocumentAndASecondRunReadsNoFile) {
+  tree_.AddFile("App/lib.dll", "library");
+  ::testing::internal::CaptureStdout();
+  ASSERT_EQ(Run("fingerprint add --app-id 4 --app-name App --version-id 1 --version-name 1 --seq 1 "
+                "--folder @App --database @digests.xml --no-cache")
+                .first,
+            kExitOk);
+  ::testing::internal::GetCapturedStdout();
+  // What a locate run writes, and the property cache's line among what it prints.
+  auto locate = [&](const std::string& options) {
+    ::testing::internal::CaptureStderr();
+    Run("locate @App --fingerprint @digests.xml -v --output @out.xml " + options);
+    std::string printed = ::testing::internal::GetCapturedStderr();
+    size_t at = printed.find("trllocator: property cache:");
+    return std::make_pair(Read("out.xml"), at == std::string::npos
+                                               ? ""
+                                               : printed.substr(at, printed.find('\n', at) - at));
+  };
+  const std::string cache = "--cache @cache/properties.sqlite";
+  auto counts = [](int reused, int read, int stored) {
+    return fmt::format(
+        "trllocator: property cache: {} values reused, {} files read, {} values stored", reused,
+        read, stored);
+  };
+  // Files written a moment ago: their times cannot vouch for them yet.
+  auto [document, line] = locate(cache);
+  EXPECT_EQ(line, counts(0, 3, 0));
+  EXPECT_THAT(document, ::testing::HasSubstr("a_id=\"4\""));  // the version was found
+  std::this_thread::sleep_for(std::chrono::milliseconds(2100));
+  EXPECT_EQ(locate(cache), std::make_pair(document, counts(0, 3, 3)));
+  EXPECT_EQ(locate(cache), std::make_pair(document, counts(3, 0, 0)));
+  EXPECT_EQ(locate("--no-cache"), std::make_pair(document, std::string()));
+}
+
+TEST(CacheFileTest, TheOptionThenXdgCacheHomeThenHome) {
+  // Options, XDG_CACHE_HOME, HOME (nullptr: not set) and the file the cache is kept in.
+  const std::tuple<CacheOptions, const char*, const char*, std::string> cases[] = {
+      {{"c.db", false}, "/xdg", "/home/u", "c.db"},
+      {{"", true}, "/xdg", "/home/u", ""},
+      {{}, "/xdg", "/home/u", "/xdg/trllocator/properties.sqlite"},
+      {{}, "xdg", "/home/u", "/home/u/.cache/trllocator/properties.sqlite"},  // must be absolute
+      {{}, nullptr, nullptr, ""},
+  };
+  auto set = [](const char* name, const char* value) {
+    value ? ::setenv(name, value, 1) : ::unsetenv(name);
+  };
+  auto saved = [](const char* name) {
+    const char* value = std::getenv(name);
+    return value ? std::optional<std::string>(value) : std::nullopt;
+  };
+  const std::optional<std::string> xdg = saved("XDG_CACHE_HOME"), home = saved("HOME");
+  for (const auto& [options, xdgCacheHome, homeFolder, file] : cases) {
+    set("XDG_CACHE_HOME", xdgCacheHome);
+    set("HOME", homeFolder);
+    EXPECT_EQ(CacheFile(options), file) << (xdgCacheHome ? xdgCacheHome : "-");
+  }
+  set("XDG_CACHE_HOME", xdg ? xdg->c_str() : nullptr);
+  set("HOME", home ? home->c_str() : nullptr);
 }
 
 // Contents are RFC 1321 test inputs, so the expected digests are the published ones.

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -19,6 +20,18 @@ enum Attribute : uint16_t {
 };
 inline constexpr uint16_t kAllAttributes = kReadOnly | kHidden | kSystem | kArchive;
 
+// Which file an open file is and which state of it: equal identities at two moments mean its
+// content may be taken as unchanged between them. Times are nanoseconds since the epoch.
+struct FileIdentity {
+  uint64_t device = 0;
+  uint64_t inode = 0;
+  uint64_t size = 0;
+  int64_t modified = 0;
+  int64_t changed = 0;  // the last change of content or of status (links, mode, owner)
+
+  bool operator==(const FileIdentity&) const = default;
+};
+
 // Random-access reading of one open file.
 class FileReader {
  public:
@@ -26,6 +39,8 @@ class FileReader {
   virtual uint64_t Size() = 0;
   // Reads up to `size` bytes at `offset`; returns how many were read (0 at the end).
   virtual size_t ReadAt(uint64_t offset, void* buffer, size_t size) = 0;
+  // The open file's identity as it is now; none where the file system cannot tell it.
+  virtual std::optional<FileIdentity> Identity() { return std::nullopt; }
 };
 
 class File {

@@ -34,6 +34,17 @@ class PosixFileReader final : public FileReader {
     return static_cast<size_t>(count);
   }
 
+  std::optional<FileIdentity> Identity() override {
+    struct stat status {};
+    if (::fstat(descriptor_, &status) != 0) return std::nullopt;
+    auto nanoseconds = [](const timespec& time) {
+      return int64_t{time.tv_sec} * 1'000'000'000 + time.tv_nsec;
+    };
+    return FileIdentity{static_cast<uint64_t>(status.st_dev), static_cast<uint64_t>(status.st_ino),
+                        static_cast<uint64_t>(status.st_size), nanoseconds(status.st_mtim),
+                        nanoseconds(status.st_ctim)};
+  }
+
  private:
   static int32_t ReadFailure(int error) {
     return error == EIO ? kDeviceIoError : kPathFileAccessError;
