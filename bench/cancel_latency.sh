@@ -47,7 +47,7 @@ echo "a whole run takes $whole s; $trials signals at random moments of it"
 
 worst=0 counted=0
 for ((i = 1; i <= trials; i++)); do
-  at=$(awk -v w="$whole" -v r="$RANDOM" 'BEGIN { printf "%.3f", w * r / 32768 }')
+  at=$(awk -v w="$whole" -v r="$RANDOM" 'BEGIN { printf "%.3f", 0.9 * w * r / 32768 }')
   # A background job of a script ignores SIGINT unless told otherwise.
   env --default-signal=INT "${run[@]}" >/dev/null 2>"$work_dir/trial.err" &
   pid=$!

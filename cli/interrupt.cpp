@@ -10,6 +10,7 @@
 #include <mutex>
 
 #include "command_error.h"
+#include "detached_end.h"
 #include "platform/event_loop.h"
 
 namespace trl::cli {
@@ -24,10 +25,9 @@ struct sigaction previous {};
 std::mutex mutex;
 std::condition_variable changed;
 bool stopped = false;  // the run stopped, or the guard goes away
-bool quickEnd = false;
 
 void OnInterrupt(int) {
-  if (interrupts.fetch_add(1) > 0) ::_exit(kExitInterrupted);
+  if (interrupts.fetch_add(1) > 0) EndFromSignalHandler(kExitInterrupted);
   if (EventLoop* current = loop.load()) current->Wake();
   if (alarmPipe[1] >= 0) {
     char byte = 1;
@@ -88,16 +88,7 @@ void InterruptGuard::Watch() {
   std::string message =
       (::isatty(STDERR_FILENO) ? "\r\x1b[K" : "") + ("trllocator: " + farewell_()) + "\n";
   std::fwrite(message.data(), 1, message.size(), stderr);
-  std::fflush(stderr);
-  ::_exit(kExitInterrupted);
-}
-
-void AllowQuickEnd() { quickEnd = true; }
-
-void QuickEnd(int code) {
-  if (!quickEnd) return;
-  std::fflush(nullptr);
-  ::_exit(code);
+  EndNow(kExitInterrupted);
 }
 
 }  // namespace trl::cli

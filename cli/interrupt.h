@@ -35,10 +35,4 @@ class InterruptGuard {
   std::thread watchdog_;
 };
 
-// Lets a cancelled command end the process at once rather than return: the program allows it,
-// tests that drive the commands in their own process do not.
-void AllowQuickEnd();
-// Ends the process with `code`, its output flushed, when that is allowed; returns otherwise.
-void QuickEnd(int code);
-
 }  // namespace trl::cli

@@ -16,6 +16,7 @@
 
 #include "atomic_file.h"
 #include "command_error.h"
+#include "detached_end.h"
 #include "document_files.h"
 #include "filter_names.h"
 #include "findings_output.h"

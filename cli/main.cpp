@@ -7,11 +7,10 @@
 #include "check_command.h"
 #include "command_error.h"
 #include "compare_command.h"
+#include "detached_end.h"
 #include "explain_command.h"
 #include "filter_command.h"
 #include "fingerprint_command.h"
-#include "huge_pages.h"
-#include "interrupt.h"
 #include "inventory_command.h"
 #include "locate_command.h"
 #include "manage_command.h"
@@ -20,10 +19,10 @@
 #include "terminal_text.h"
 #include "version.h"
 
-int main(int argc, char** argv) {
-  using namespace trl::cli;
-  StartWithHugePages(argv);
-  AllowQuickEnd();
+namespace trl::cli {
+namespace {
+
+int RunProgram(int argc, char** argv) {
   CLI::App app{"trllocator: finds which known applications are installed, and which version"};
   app.set_version_flag("--version", std::string("trllocator ") + TRL_VERSION);
   app.footer(
@@ -57,4 +56,11 @@ int main(int argc, char** argv) {
   }
   std::printf("%s", app.help().c_str());
   return kExitOk;
+}
+
+}  // namespace
+}  // namespace trl::cli
+
+int main(int argc, char** argv) {
+  return trl::cli::RunWithDetachedEnd([&] { return trl::cli::RunProgram(argc, argv); });
 }

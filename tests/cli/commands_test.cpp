@@ -22,6 +22,7 @@
 #include "cache_option.h"
 #include "command_error.h"
 #include "compare_command.h"
+#include "detached_end.h"
 #include "filter_command.h"
 #include "filter_names.h"
 #include "fingerprint_author.h"
@@ -269,6 +270,20 @@ TEST(InterruptGuardTest, ARunThatDoesNotStopInTimeIsNotWaitedFor) {
   EXPECT_EXIT(interrupted(false), ::testing::ExitedWithCode(kExitInterrupted),
               "^trllocator: gave up\n$");
   EXPECT_EXIT(interrupted(true), ::testing::ExitedWithCode(7), "^$");
+}
+
+// The program ends as its child does: with the code it tells before ending, with the code it
+// returns, or by the signal that ended it.
+TEST(DetachedEndTest, TheProgramEndsAsItsChildDoes) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  EXPECT_EXIT(std::exit(RunWithDetachedEnd([] {
+                QuickEnd(5);
+                return 6;
+              })),
+              ::testing::ExitedWithCode(5), "");
+  EXPECT_EXIT(std::exit(RunWithDetachedEnd([] { return 4; })), ::testing::ExitedWithCode(4), "");
+  EXPECT_EXIT(std::exit(RunWithDetachedEnd([] { return std::raise(SIGTERM); })),
+              ::testing::KilledBySignal(SIGTERM), "");
 }
 
 TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
