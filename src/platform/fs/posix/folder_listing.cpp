@@ -3,12 +3,11 @@
 #include <dirent.h>
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
 #include <optional>
 #include <string_view>
-#include <unordered_map>
+#include <utility>
 
+#include "platform/fs/posix/folder_entries.h"
 #include "platform/fs/posix/posix_file.h"
 #include "platform/fs/posix/sys_calls.h"
 #include "platform/text.h"
@@ -24,24 +23,49 @@ bool MayChangeCase(std::string_view name) {
   });
 }
 
+void AppendLowerCase(std::string& out, std::string_view name) {
+  if (std::all_of(name.begin(), name.end(),
+                  [](char c) { return static_cast<unsigned char>(c) < 0x80; })) {
+    for (char c : name) out += static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c);
+  } else {
+    out += LowerCase(name);
+  }
+}
+
+// Marks the items whose lower-cased names are equal. The names are sorted once instead of put in
+// a table: a folder holds few entries, and a name is lower-cased only once, into one buffer.
 template <class Items, class NameOf, class Mark>
 void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
-  std::unordered_map<std::string, int> names;
-  for (const auto& item : items) {
-    const std::string& name = nameOf(item);
-    if (MayChangeCase(name)) names.try_emplace(LowerCase(name), 0);
+  if (std::none_of(items.begin(), items.end(),
+                   [&](const auto& item) { return MayChangeCase(nameOf(item)); })) {
+    return;
   }
-  if (names.empty()) return;
-  auto folded = [&](const std::string& name) {
-    return MayChangeCase(name) ? LowerCase(name) : name;
-  };
-  for (const auto& item : items) {
-    auto known = names.find(folded(nameOf(item)));
-    if (known != names.end()) ++known->second;
+  // Where each name's lower-cased form lies in `folded` (offset and size); none when the name is
+  // its own.
+  std::string folded;
+  std::vector<std::optional<std::pair<size_t, size_t>>> spans(items.size());
+  for (size_t i = 0; i < items.size(); ++i) {
+    const std::string& name = nameOf(items[i]);
+    if (!MayChangeCase(name)) continue;
+    size_t start = folded.size();
+    AppendLowerCase(folded, name);
+    spans[i].emplace(start, folded.size() - start);
   }
-  for (auto& item : items) {
-    auto known = names.find(folded(nameOf(item)));
-    if (known != names.end() && known->second > 1) mark(item);
+  std::vector<std::pair<std::string_view, size_t>> keys;
+  keys.reserve(items.size());
+  for (size_t i = 0; i < items.size(); ++i) {
+    keys.emplace_back(spans[i] ? std::string_view(folded).substr(spans[i]->first, spans[i]->second)
+                               : std::string_view(nameOf(items[i])),
+                      i);
+  }
+  std::sort(keys.begin(), keys.end());
+  for (size_t run = 0; run < keys.size();) {
+    size_t end = run + 1;
+    while (end < keys.size() && keys[end].first == keys[run].first) ++end;
+    if (end - run > 1) {
+      for (size_t k = run; k < end; ++k) mark(items[keys[k].second]);
+    }
+    run = end;
   }
 }
 
@@ -49,18 +73,10 @@ void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
 
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
   FolderListing listing;
-  std::unique_ptr<DIR, int (*)(DIR*)> stream(OpenDirectory(folder->Native()), closedir);
-  if (!stream) {
-    listing.error = errno;
-    return listing;
-  }
-  for (;;) {
-    errno = 0;  // readdir tells an error from the end only through errno
-    const dirent* entry = readdir(stream.get());
-    if (entry == nullptr) break;
-    const char* name = entry->d_name;
-    if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) continue;
-    unsigned char type = entry->d_type;
+  FolderEntries entries(folder->Native());
+  std::string_view name;
+  unsigned char type = DT_UNKNOWN;
+  while (entries.Next(name, type)) {
     std::optional<ItemStatus> status;
     if (type == DT_UNKNOWN) {
       struct stat item {};
@@ -79,12 +95,12 @@ FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
     if (type == DT_DIR) {
       auto place =
           std::make_shared<FolderPlace>(folder->NativeChild(name), folder->PathChild(name));
-      listing.subFolders.push_back({std::move(place), name});
+      listing.subFolders.push_back({std::move(place), std::string(name)});
     } else {
-      listing.files.push_back(std::make_unique<PosixFile>(folder, name, type, status));
+      listing.files.push_back(std::make_unique<PosixFile>(folder, std::string(name), type, status));
     }
   }
-  listing.error = errno;
+  listing.error = entries.Error();
   if (listing.error != 0) {
     listing.files.clear();
     listing.subFolders.clear();

@@ -9,7 +9,7 @@
 
 namespace trl::fs::posix {
 
-// One folder's entries as one readdir pass finds them, in the order it finds them.
+// One folder's entries as one pass over them finds them, in the order it finds them.
 struct FolderListing {
   struct SubFolder {
     std::shared_ptr<FolderPlace> place;

@@ -126,21 +126,13 @@ int RealPath(const std::string& path, std::string& out) {
   return 0;
 }
 
-DIR* OpenDirectory(const std::string& path) {
+int OpenFolder(const std::string& path) {
   ++counts.opendir;
-  DIR* directory = ::opendir(path.empty() ? "." : path.c_str());
-  if (directory != nullptr || errno != ENAMETOOLONG) return directory;
-  int descriptor = AtLongPath(path, [](int folder, const char* name) {
-    return ::openat(folder, name, O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  });
-  if (descriptor < 0) return nullptr;
-  directory = ::fdopendir(descriptor);
-  if (directory == nullptr) {
-    int error = errno;
-    ::close(descriptor);
-    errno = error;
-  }
-  return directory;
+  constexpr int kFlags = O_RDONLY | O_NONBLOCK | O_DIRECTORY | O_CLOEXEC;
+  return Reaching(
+      path.empty() ? std::string(".") : path,
+      [](const std::string& at) { return ::open(at.c_str(), kFlags); },
+      [](int folder, const char* name) { return ::openat(folder, name, kFlags); });
 }
 
 int OpenFile(const std::string& path, int flags) {
