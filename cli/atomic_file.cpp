@@ -59,6 +59,40 @@ bool WriteAll(int fd, const char* data, size_t left) {
   return true;
 }
 
+// Writes the text and a line end, gathered into large writes. False with errno set when a write
+// failed; the pieces after it are passed over.
+bool WritePieces(int fd, const TextPieces& text) {
+  constexpr size_t kChunk = 1 << 20;
+  std::string chunk;
+  chunk.reserve(kChunk);
+  bool written = true;
+  int error = 0;
+  auto flush = [&] {
+    if (written && !WriteAll(fd, chunk.data(), chunk.size())) {
+      written = false;
+      error = errno;
+    }
+    chunk.clear();
+  };
+  auto put = [&](std::string_view piece) {
+    if (!written) return;
+    if (chunk.size() + piece.size() > kChunk) flush();
+    if (piece.size() >= kChunk) {
+      if (!WriteAll(fd, piece.data(), piece.size())) {
+        written = false;
+        error = errno;
+      }
+      return;
+    }
+    chunk += piece;
+  };
+  text(put);
+  put("\n");
+  flush();
+  errno = error;
+  return written;
+}
+
 // Makes a rename in the folder of `path` durable.
 void SyncFolderOf(const std::string& path) {
   std::filesystem::path folder = std::filesystem::path(path).parent_path();
@@ -175,6 +209,12 @@ std::string SaveTarget(const std::string& path) {
 
 void ReplaceFileAtomically(const std::string& path, const std::string& text,
                            const Replacement& how) {
+  ReplaceFileAtomically(
+      path, [&](const auto& put) { put(text); }, how);
+}
+
+void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
+                           const Replacement& how) {
   std::string file = how.throughLink ? SaveTarget(path) : path;
   struct stat existing {};
   bool exists = ::lstat(file.c_str(), &existing) == 0;
@@ -189,8 +229,13 @@ void ReplaceFileAtomically(const std::string& path, const std::string& text,
   Descriptor fd(MakeTemporary(file, temporary));
   if (fd.Get() < 0) Fail("write", file, errno);
   KeepOwnership(fd.Get(), exists ? &existing : nullptr);
-  bool written = WriteAll(fd.Get(), text.data(), text.size()) && WriteAll(fd.Get(), "\n", 1) &&
-                 ::fsync(fd.Get()) == 0;
+  bool written = false;
+  try {
+    written = WritePieces(fd.Get(), text) && ::fsync(fd.Get()) == 0;
+  } catch (...) {
+    ::unlink(temporary.c_str());
+    throw;
+  }
   int error = errno;
   if (!written) {
     ::unlink(temporary.c_str());

@@ -206,7 +206,13 @@ void Search::Finish() {
   EndRun(on);
 }
 
-std::string Search::ResultText() { return Use(results_).Xml(); }
+std::string Search::ResultText() {
+  xml::Document& results = Use(results_);
+  // A document without content has no text for a writer to write.
+  if (!resultsWriter_ || !results.DocumentElement()) return results.Xml();
+  resultsWriter_(results);
+  return "";
+}
 
 std::string Search::ResultsXml() { return results_ ? results_->Xml() : ""; }
 

@@ -10,6 +10,7 @@
 #include <fstream>
 #include <iterator>
 #include <thread>
+#include <vector>
 
 #include "atomic_file.h"
 #include "command_error.h"
@@ -85,6 +86,44 @@ TEST_F(SafeWritesTest, ASaveKeepsWhatItReplaces) {
   if (root) EXPECT_EQ(status.st_uid, 4321u);
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Ab12Cd")));
   EXPECT_TRUE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Xy34Zw")));
+}
+
+// A text made in pieces arrives whole and in order, whatever the pieces' sizes against the writes
+// that gather them; a text whose making fails leaves the file as it was and nothing beside it.
+TEST_F(SafeWritesTest, ATextInPiecesReplacesAFileWhole) {
+  constexpr size_t kMiB = 1 << 20;
+  const std::vector<size_t> cases[] = {
+      {}, {5, 7, 11}, {kMiB - 3, 2, 1, 4}, {3, kMiB, 5}, {kMiB + 1, 2 * kMiB + 7, 9},
+  };
+  for (const auto& sizes : cases) {
+    std::string expected;
+    std::vector<std::string> pieces;
+    for (size_t size : sizes) {
+      std::string piece(size, '\0');
+      for (size_t i = 0; i < size; ++i)
+        piece[i] = static_cast<char>('a' + (expected.size() + i) % 23);
+      expected += piece;
+      pieces.push_back(std::move(piece));
+    }
+    ReplaceFileAtomically(tree_.Native("out.xml"),
+                          [&](const auto& put) {
+                            for (const std::string& piece : pieces) put(piece);
+                          },
+                          {});
+    ASSERT_EQ(Read("out.xml"), expected + "\n") << sizes.size() << " pieces";
+  }
+  tree_.AddFile("kept.xml", "old");
+  EXPECT_THROW(ReplaceFileAtomically(tree_.Native("kept.xml"),
+                                     [](const auto& put) {
+                                       put("<partial");
+                                       throw Failure(kOutOfMemory, "out of memory");
+                                     },
+                                     {}),
+               Failure);
+  EXPECT_EQ(Read("kept.xml"), "old");
+  for (const auto& entry : std::filesystem::directory_iterator(tree_.Native(""))) {
+    EXPECT_EQ(entry.path().string().find(".trl-"), std::string::npos) << entry.path();
+  }
 }
 
 // A second save of the same file waits until the first has replaced it.
