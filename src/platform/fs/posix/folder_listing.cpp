@@ -3,6 +3,7 @@
 #include <dirent.h>
 
 #include <algorithm>
+#include <cstdint>
 #include <optional>
 #include <string_view>
 #include <utility>
@@ -24,16 +25,27 @@ bool MayChangeCase(std::string_view name) {
 }
 
 void AppendLowerCase(std::string& out, std::string_view name) {
-  if (std::all_of(name.begin(), name.end(),
-                  [](char c) { return static_cast<unsigned char>(c) < 0x80; })) {
-    for (char c : name) out += static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c);
-  } else {
+  if (std::any_of(name.begin(), name.end(),
+                  [](char c) { return static_cast<unsigned char>(c) >= 0x80; })) {
     out += LowerCase(name);
+    return;
   }
+  size_t start = out.size();
+  out += name;
+  std::for_each(out.begin() + static_cast<ptrdiff_t>(start), out.end(),
+                [](char& c) { c = static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c); });
 }
 
-// Marks the items whose lower-cased names are equal. The names are sorted once instead of put in
-// a table: a folder holds few entries, and a name is lower-cased only once, into one buffer.
+// FNV-1a: sorting by a number is far cheaper than sorting by text.
+uint64_t Fingerprint(std::string_view text) {
+  uint64_t hash = 0xcbf29ce484222325;
+  for (char c : text) hash = (hash ^ static_cast<unsigned char>(c)) * 0x100000001b3;
+  return hash;
+}
+
+// Marks the items whose lower-cased names are equal. Their numbers are sorted once instead of the
+// names put in a table: a folder holds few entries, and a name is lower-cased only once, into one
+// buffer.
 template <class Items, class NameOf, class Mark>
 void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
   if (std::none_of(items.begin(), items.end(),
@@ -51,19 +63,25 @@ void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
     AppendLowerCase(folded, name);
     spans[i].emplace(start, folded.size() - start);
   }
-  std::vector<std::pair<std::string_view, size_t>> keys;
+  auto keyOf = [&](size_t i) {
+    return spans[i] ? std::string_view(folded).substr(spans[i]->first, spans[i]->second)
+                    : std::string_view(nameOf(items[i]));
+  };
+  std::vector<std::pair<uint64_t, size_t>> keys;
   keys.reserve(items.size());
-  for (size_t i = 0; i < items.size(); ++i) {
-    keys.emplace_back(spans[i] ? std::string_view(folded).substr(spans[i]->first, spans[i]->second)
-                               : std::string_view(nameOf(items[i])),
-                      i);
-  }
+  for (size_t i = 0; i < items.size(); ++i) keys.emplace_back(Fingerprint(keyOf(i)), i);
   std::sort(keys.begin(), keys.end());
+  // Within a run of equal numbers, each key is held against the others: numbers can collide.
   for (size_t run = 0; run < keys.size();) {
     size_t end = run + 1;
     while (end < keys.size() && keys[end].first == keys[run].first) ++end;
-    if (end - run > 1) {
-      for (size_t k = run; k < end; ++k) mark(items[keys[k].second]);
+    for (size_t k = run; k < end; ++k) {
+      for (size_t other = run; other < end; ++other) {
+        if (other != k && keyOf(keys[k].second) == keyOf(keys[other].second)) {
+          mark(items[keys[k].second]);
+          break;
+        }
+      }
     }
     run = end;
   }
