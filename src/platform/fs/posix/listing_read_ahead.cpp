@@ -15,6 +15,7 @@ ListingReadAhead::~ListingReadAhead() {
 }
 
 FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder) {
+  if (auto held = TakeHeld(folder)) return std::move(*held);
   std::unique_lock lock(mutex_);
   if (!StartReader()) {
     lock.unlock();
@@ -22,16 +23,16 @@ FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder)
   }
   bool asked = false;
   for (;;) {
-    auto found = std::find_if(ready_.begin(), ready_.end(),
+    TakeOverReady();
+    auto found = std::find_if(held_.begin(), held_.end(),
                               [&](const Ready& ready) { return ready.folder == folder; });
-    if (found != ready_.end()) {
-      std::optional<FolderListing> listing = std::move(found->listing);
-      DropReady(found + 1);
-      if (readerIdle_ && BelowHalf()) work_.notify_one();
+    if (found != held_.end()) {
       lock.unlock();
-      return listing ? std::move(*listing) : ListFolder(folder);
+      return *TakeHeld(folder);
     }
     if (!asked) {
+      // Everything held comes before `folder` in walk order, or belongs to a walk left behind.
+      held_.clear();
       ReadNext(folder);
       asked = true;
     }
@@ -41,9 +42,36 @@ FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder)
   }
 }
 
+std::optional<FolderListing> ListingReadAhead::TakeHeld(
+    const std::shared_ptr<FolderPlace>& folder) {
+  auto found = std::find_if(held_.begin(), held_.end(),
+                            [&](const Ready& ready) { return ready.folder == folder; });
+  if (found == held_.end()) return std::nullopt;
+  std::optional<FolderListing> listing = std::move(found->listing);
+  held_.erase(held_.begin(), found + 1);
+  return listing ? std::move(*listing) : ListFolder(folder);
+}
+
+void ListingReadAhead::TakeOverReady() {
+  for (Ready& ready : ready_) held_.push_back(std::move(ready));
+  DropReady(ready_.end());
+  for (auto& files : freed_) toFree_.push_back(std::move(files));
+  freed_.clear();
+  if (readerIdle_) work_.notify_one();
+}
+
 void ListingReadAhead::Recycle(Collection<File> files) {
-  std::lock_guard lock(mutex_);
-  if (reader_.joinable()) toFree_.push_back(std::move(files));
+  freed_.push_back(std::move(files));
+  // Handed over now and then even when the walk finds its listings held.
+  if (freed_.size() >= maxReadyFolders_) {
+    std::lock_guard lock(mutex_);
+    if (!reader_.joinable()) {
+      freed_.clear();
+      return;
+    }
+    for (auto& batch : freed_) toFree_.push_back(std::move(batch));
+    freed_.clear();
+  }
 }
 
 void ListingReadAhead::ReadNext(const std::shared_ptr<FolderPlace>& folder) {
@@ -78,10 +106,6 @@ void ListingReadAhead::DropReady(std::deque<Ready>::iterator end) {
 
 bool ListingReadAhead::HasRoom() const {
   return ready_.size() < maxReadyFolders_ && readyEntries_ < maxReadyEntries_;
-}
-
-bool ListingReadAhead::BelowHalf() const {
-  return ready_.size() <= maxReadyFolders_ / 2 && readyEntries_ <= maxReadyEntries_ / 2;
 }
 
 void ListingReadAhead::Run() {
