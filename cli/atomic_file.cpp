@@ -12,6 +12,7 @@
 #include <filesystem>
 #include <random>
 
+#include "chunk_writer.h"
 #include "command_error.h"
 
 namespace trl::cli {
@@ -46,51 +47,13 @@ class Descriptor {
   int fd_;
 };
 
-bool WriteAll(int fd, const char* data, size_t left) {
-  while (left > 0) {
-    ssize_t written = ::write(fd, data, left);
-    if (written < 0) {
-      if (errno == EINTR) continue;
-      return false;
-    }
-    data += written;
-    left -= static_cast<size_t>(written);
-  }
-  return true;
-}
-
 // Writes the text and a line end, gathered into large writes. False with errno set when a write
-// failed; the pieces after it are passed over.
+// failed.
 bool WritePieces(int fd, const TextPieces& text) {
-  constexpr size_t kChunk = 1 << 20;
-  std::string chunk;
-  chunk.reserve(kChunk);
-  bool written = true;
-  int error = 0;
-  auto flush = [&] {
-    if (written && !WriteAll(fd, chunk.data(), chunk.size())) {
-      written = false;
-      error = errno;
-    }
-    chunk.clear();
-  };
-  auto put = [&](std::string_view piece) {
-    if (!written) return;
-    if (chunk.size() + piece.size() > kChunk) flush();
-    if (piece.size() >= kChunk) {
-      if (!WriteAll(fd, piece.data(), piece.size())) {
-        written = false;
-        error = errno;
-      }
-      return;
-    }
-    chunk += piece;
-  };
-  text(put);
-  put("\n");
-  flush();
-  errno = error;
-  return written;
+  ChunkWriter writer(fd);
+  text([&](std::string_view piece) { writer.Put(piece); });
+  writer.Put("\n");
+  return writer.Finish();
 }
 
 // Makes a rename in the folder of `path` durable.

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "atomic_file.h"
+#include "chunk_writer.h"
 #include "command_error.h"
 #include "document_files.h"
 #include "platform/failure.h"
@@ -124,6 +125,36 @@ TEST_F(SafeWritesTest, ATextInPiecesReplacesAFileWhole) {
   for (const auto& entry : std::filesystem::directory_iterator(tree_.Native(""))) {
     EXPECT_EQ(entry.path().string().find(".trl-"), std::string::npos) << entry.path();
   }
+}
+
+// Chunks handed to the writing thread arrive in order, however the pieces fall against them; a
+// failed write is told at the end.
+TEST_F(SafeWritesTest, ChunksArriveInOrderAndAFailureIsTold) {
+  for (size_t chunkSize : {1, 7, 64, 1 << 16}) {
+    tree_.AddFile("chunks.txt", "");
+    int fd = ::open(tree_.Native("chunks.txt").c_str(), O_WRONLY | O_TRUNC);
+    ASSERT_GE(fd, 0);
+    std::string expected;
+    {
+      ChunkWriter writer(fd, chunkSize);
+      for (size_t size = 0; size < 300; size += 13) {
+        std::string piece(size, static_cast<char>('a' + size % 26));
+        writer.Put(piece);
+        expected += piece;
+      }
+      EXPECT_TRUE(writer.Finish());
+    }
+    ::close(fd);
+    EXPECT_EQ(Read("chunks.txt"), expected) << chunkSize;
+  }
+  int full = ::open("/dev/full", O_WRONLY);
+  ASSERT_GE(full, 0);
+  ChunkWriter writer(full, 4);
+  writer.Put("more than a chunk");
+  writer.Put("and more");
+  EXPECT_FALSE(writer.Finish());
+  EXPECT_EQ(errno, ENOSPC);
+  ::close(full);
 }
 
 // A second save of the same file waits until the first has replaced it.
