@@ -21,7 +21,9 @@ bool WriteAll(int fd, const char* data, size_t size) {
 }
 
 ChunkWriter::ChunkWriter(int fd, size_t chunkSize) : fd_(fd), chunkSize_(chunkSize) {
-  gathering_.reserve(chunkSize_);
+  // Room for a chunk and a piece beyond it, in both buffers: they change places at each hand-over.
+  gathering_.reserve(chunkSize_ + (chunkSize_ >> 2));
+  writing_.reserve(gathering_.capacity());
   try {
     writer_ = std::thread([this] { Run(); });
   } catch (const std::system_error&) {

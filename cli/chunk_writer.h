@@ -17,7 +17,7 @@ bool WriteAll(int fd, const char* data, size_t size);
 // goes. After a failed write the rest is passed over.
 class ChunkWriter {
  public:
-  explicit ChunkWriter(int fd, size_t chunkSize = size_t{1} << 20);
+  explicit ChunkWriter(int fd, size_t chunkSize = size_t{256} << 10);
   ~ChunkWriter();
   ChunkWriter(const ChunkWriter&) = delete;
   ChunkWriter& operator=(const ChunkWriter&) = delete;
