@@ -5,6 +5,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <utility>
 
 #include "platform/fs/posix/sys_calls.h"
 
@@ -21,6 +22,17 @@ std::vector<std::unique_ptr<FolderEntries::Buffer>>& FolderEntries::SpareBuffers
 }
 
 FolderEntries::FolderEntries(const std::string& native) : descriptor_(OpenFolder(native)) {
+  TakeBuffer();
+}
+
+FolderEntries::FolderEntries(int parent, std::string_view name)
+    : descriptor_(OpenFolderAt(parent, std::string(name))) {
+  TakeBuffer();
+}
+
+int FolderEntries::Release() { return std::exchange(descriptor_, -1); }
+
+void FolderEntries::TakeBuffer() {
   if (descriptor_ < 0) {
     error_ = errno;
     return;

@@ -14,6 +14,8 @@ class FolderEntries {
  public:
   // Opens the folder at `native` ("" is the working folder); Error() says why it could not be.
   explicit FolderEntries(const std::string& native);
+  // Opens the folder `name` of the open folder `parent`.
+  FolderEntries(int parent, std::string_view name);
   ~FolderEntries();
   FolderEntries(const FolderEntries&) = delete;
   FolderEntries& operator=(const FolderEntries&) = delete;
@@ -22,9 +24,12 @@ class FolderEntries {
   bool Next(std::string_view& name, unsigned char& type);
   // The errno value that stopped the listing, 0 when it is complete so far.
   int Error() const { return error_; }
+  // The folder's descriptor, now the caller's to close; -1 when it is not open.
+  int Release();
 
  private:
   struct Buffer;
+  void TakeBuffer();
   // Buffers of listings that ended, for the next listing on this thread.
   static std::vector<std::unique_ptr<Buffer>>& SpareBuffers();
 

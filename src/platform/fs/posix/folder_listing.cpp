@@ -90,8 +90,12 @@ void MarkCaseSiblings(Items& items, NameOf nameOf, Mark mark) {
 }  // namespace
 
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
-  FolderListing listing;
   FolderEntries entries(folder->Native());
+  return ListFolder(folder, entries);
+}
+
+FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder, FolderEntries& entries) {
+  FolderListing listing;
   std::string_view name;
   unsigned char type = DT_UNKNOWN;
   while (entries.Next(name, type)) {
@@ -112,7 +116,7 @@ FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder) {
     }
     if (type == DT_DIR) {
       auto place =
-          std::make_shared<FolderPlace>(folder->NativeChild(name), folder->PathChild(name));
+          std::make_shared<FolderPlace>(folder->NativeChild(name), folder->PathChild(name), folder);
       listing.subFolders.push_back({std::move(place), std::string(name)});
     } else {
       listing.files.push_back(std::make_unique<PosixFile>(folder, std::string(name), type, status));

@@ -1,9 +1,60 @@
 #include "platform/fs/posix/listing_read_ahead.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <system_error>
 
 namespace trl::fs::posix {
+namespace {
+
+// The folders on the read-ahead's way down, kept open so that each subfolder is opened from its
+// parent: one name for the system to look up instead of every name of its path.
+class OpenFolders {
+ public:
+  OpenFolders() = default;
+  ~OpenFolders() { CloseAbove(0); }
+  OpenFolders(const OpenFolders&) = delete;
+  OpenFolders& operator=(const OpenFolders&) = delete;
+
+  // `folder`, opened from its parent when that is open. Folders opened after the parent are
+  // closed: a depth-first walk has left them.
+  FolderEntries Open(const FolderPlace& folder) {
+    const auto& parent = folder.Parent();
+    auto at = std::find_if(open_.rbegin(), open_.rend(),
+                           [&](const Held& held) { return parent && held.place == parent; });
+    CloseAbove(static_cast<size_t>(open_.rend() - at));
+    if (open_.empty()) return FolderEntries(folder.Native());
+    return FolderEntries(open_.back().descriptor, folder.NativeName());
+  }
+  // Keeps `folder` open for its subfolders.
+  void Keep(std::shared_ptr<const FolderPlace> folder, FolderEntries& entries) {
+    if (open_.size() < kMaxOpen) {
+      int descriptor = entries.Release();
+      if (descriptor >= 0) open_.push_back({std::move(folder), descriptor});
+    }
+  }
+
+ private:
+  // Deeper folders are opened by their paths: descriptors are a limited resource.
+  static constexpr size_t kMaxOpen = 32;
+
+  struct Held {
+    std::shared_ptr<const FolderPlace> place;
+    int descriptor;
+  };
+
+  void CloseAbove(size_t keep) {
+    while (open_.size() > keep) {
+      ::close(open_.back().descriptor);
+      open_.pop_back();
+    }
+  }
+
+  std::vector<Held> open_;
+};
+
+}  // namespace
 
 ListingReadAhead::~ListingReadAhead() {
   {
@@ -109,6 +160,7 @@ bool ListingReadAhead::HasRoom() const {
 }
 
 void ListingReadAhead::Run() {
+  OpenFolders open;
   std::unique_lock lock(mutex_);
   for (;;) {
     readerIdle_ = true;
@@ -130,7 +182,9 @@ void ListingReadAhead::Run() {
     toFree.clear();
     std::optional<FolderListing> listing;
     try {
-      listing = ListFolder(folder);
+      FolderEntries entries = open.Open(*folder);
+      listing = ListFolder(folder, entries);
+      if (!listing->subFolders.empty()) open.Keep(folder, entries);
     } catch (const std::exception&) {
       // Left to the walk's thread, which lists the folder itself and meets the failure there.
     }

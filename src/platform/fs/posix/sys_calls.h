@@ -34,6 +34,8 @@ std::string GetExtendedAttribute(const std::string& path, const char* name);
 int RealPath(const std::string& path, std::string& out);
 // A descriptor of the folder to list, or -1 with errno set; an empty path is the working folder.
 int OpenFolder(const std::string& path);
+// The folder `name` of the open folder `parent`, the same way.
+int OpenFolderAt(int parent, const std::string& name);
 // open(2): a descriptor, or -1 with errno set.
 int OpenFile(const std::string& path, int flags);
 
