@@ -12,6 +12,7 @@
 #include <filesystem>
 #include <random>
 
+#include "chunk_writer.h"
 #include "command_error.h"
 
 namespace trl::cli {
@@ -46,17 +47,13 @@ class Descriptor {
   int fd_;
 };
 
-bool WriteAll(int fd, const char* data, size_t left) {
-  while (left > 0) {
-    ssize_t written = ::write(fd, data, left);
-    if (written < 0) {
-      if (errno == EINTR) continue;
-      return false;
-    }
-    data += written;
-    left -= static_cast<size_t>(written);
-  }
-  return true;
+// Writes the text and a line end, gathered into large writes. False with errno set when a write
+// failed.
+bool WritePieces(int fd, const TextPieces& text) {
+  ChunkWriter writer(fd);
+  text([&](std::string_view piece) { writer.Put(piece); });
+  writer.Put("\n");
+  return writer.Finish();
 }
 
 // Makes a rename in the folder of `path` durable.
@@ -175,6 +172,12 @@ std::string SaveTarget(const std::string& path) {
 
 void ReplaceFileAtomically(const std::string& path, const std::string& text,
                            const Replacement& how) {
+  ReplaceFileAtomically(
+      path, [&](const auto& put) { put(text); }, how);
+}
+
+void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
+                           const Replacement& how) {
   std::string file = how.throughLink ? SaveTarget(path) : path;
   struct stat existing {};
   bool exists = ::lstat(file.c_str(), &existing) == 0;
@@ -189,8 +192,13 @@ void ReplaceFileAtomically(const std::string& path, const std::string& text,
   Descriptor fd(MakeTemporary(file, temporary));
   if (fd.Get() < 0) Fail("write", file, errno);
   KeepOwnership(fd.Get(), exists ? &existing : nullptr);
-  bool written = WriteAll(fd.Get(), text.data(), text.size()) && WriteAll(fd.Get(), "\n", 1) &&
-                 ::fsync(fd.Get()) == 0;
+  bool written = false;
+  try {
+    written = WritePieces(fd.Get(), text) && ::fsync(fd.Get()) == 0;
+  } catch (...) {
+    ::unlink(temporary.c_str());
+    throw;
+  }
   int error = errno;
   if (!written) {
     ::unlink(temporary.c_str());

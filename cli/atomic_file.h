@@ -1,6 +1,8 @@
 #pragma once
 
+#include <functional>
 #include <string>
+#include <string_view>
 
 namespace trl::cli {
 
@@ -23,5 +25,11 @@ struct Replacement {
 // first. A failure leaves the file as it was and is a CommandError with kExitFailed.
 void ReplaceFileAtomically(const std::string& path, const std::string& text,
                            const Replacement& how);
+
+// A text made piece by piece: hands each piece, in order, to `put`.
+using TextPieces = std::function<void(const std::function<void(std::string_view)>& put)>;
+
+// The same for a text that is never held whole.
+void ReplaceFileAtomically(const std::string& path, const TextPieces& text, const Replacement& how);
 
 }  // namespace trl::cli

@@ -63,6 +63,10 @@ xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const Documen
 }
 
 void WriteTextOutput(const std::string& text, const std::string& path) {
+  WriteTextOutput([&](const auto& put) { put(text); }, path);
+}
+
+void WriteTextOutput(const TextPieces& text, const std::string& path) {
   struct stat status {};
   bool stream = path.empty() || (::lstat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode) &&
                                  !S_ISDIR(status.st_mode));
@@ -82,9 +86,13 @@ void WriteTextOutput(const std::string& text, const std::string& path) {
         kExitFailed);
   }
   std::FILE* output = ::fdopen(fd, "w");
-  bool written = output != nullptr &&
-                 std::fwrite(text.data(), 1, text.size(), output) == text.size() &&
-                 std::fputc('\n', output) != EOF && std::fflush(output) == 0;
+  bool written = output != nullptr;
+  if (written) {
+    text([&](std::string_view piece) {
+      written = written && std::fwrite(piece.data(), 1, piece.size(), output) == piece.size();
+    });
+  }
+  written = written && std::fputc('\n', output) != EOF && std::fflush(output) == 0;
   int error = errno;
   if (output == nullptr) {
     ::close(fd);

@@ -3,6 +3,7 @@
 #include <string>
 #include <string_view>
 
+#include "atomic_file.h"
 #include "document_kind.h"
 #include "trl/xml.h"
 
@@ -18,5 +19,7 @@ xml::DocumentPtr LoadOptionalDocumentFile(const std::string& path, const Documen
 // Writes `text` and a line end to the file at `path`, or to standard output when `path` is empty.
 // A file that cannot be written is a CommandError with exit code kExitFailed.
 void WriteTextOutput(const std::string& text, const std::string& path);
+// The same for a text made piece by piece.
+void WriteTextOutput(const TextPieces& text, const std::string& path);
 
 }  // namespace trl::cli

@@ -1,5 +1,6 @@
 #include "search_command.h"
 
+#include <exception>
 #include <memory>
 #include <string>
 #include <vector>
@@ -39,8 +40,20 @@ int RunSearch(const SearchOptions& options) {
   CacheForRun cache(options.stage.cache, options.stage.quiet, options.stage.verbose);
   Search search(FileSystemWithShares(options.stage.shares));
   search.Asynchronous(false);
+  // The document goes out as it is printed: its text is never held whole beside it.
+  bool written = false;
+  std::exception_ptr writeFailure;
+  search.ResultsWriter([&](const xml::Document& document) {
+    try {
+      WriteTextOutput([&](const auto& put) { document.WriteXml(put); }, options.stage.output);
+      written = true;
+    } catch (...) {
+      writeFailure = std::current_exception();
+    }
+  });
   std::string text = search.Start(searchOptions, applicationOptions, fingerprint, results);
-  return WriteStageOutput(text, "search", options.stage);
+  if (writeFailure) std::rethrow_exception(writeFailure);
+  return written ? kExitOk : WriteStageOutput(text, "search", options.stage);
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -41,6 +42,13 @@ class Search : public Worker {
   std::string Start(xml::DocumentPtr objSearchOptionsDOM,
                     xml::DocumentPtr objApplicationOptionsDOM = nullptr,
                     xml::DocumentPtr objFingerprintDOM = nullptr);
+
+  // With a writer, a synchronous Start hands the local-files document to it where it would take
+  // the document's text, and returns "": a document of millions of files is written out without
+  // being held a second time as one text. A failure of the writer is reported as any other.
+  void ResultsWriter(std::function<void(const xml::Document&)> write) {
+    resultsWriter_ = std::move(write);
+  }
 
  protected:
   void RunBody() override;
@@ -116,6 +124,7 @@ class Search : public Worker {
   xml::DocumentPtr objApplicationOptionsDOM;
   xml::DocumentPtr objFingerprintDOM;
   xml::DocumentPtr results_;
+  std::function<void(const xml::Document&)> resultsWriter_;
 
   int32_t lngComputerCounter = 0;
   int32_t lngDriveCounter = 0;

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <initializer_list>
 #include <memory>
 #include <optional>
@@ -80,6 +81,8 @@ class Node {
 
   // Raw serialisation of the node and everything below it, without declaration.
   std::string Xml() const;
+  // The same text handed to `out` in pieces, in order, instead of held whole.
+  void WriteXml(const std::function<void(std::string_view)>& out) const;
 
   // The underlying node object (for the layer's own tests and for hashing); opaque to callers.
   const void* Id() const { return node_; }
@@ -135,6 +138,8 @@ class Document {
 
   // The whole document, raw, without declaration; "" when it has no content.
   std::string Xml() const;
+  // The same text handed to `out` in pieces, in order: nothing when it has no content.
+  void WriteXml(const std::function<void(std::string_view)>& out) const;
 
   Node AsNode();           // the document node itself: selections from here start at the root
   Node DocumentElement();  // no object when there is none

@@ -10,8 +10,10 @@
 #include <fstream>
 #include <iterator>
 #include <thread>
+#include <vector>
 
 #include "atomic_file.h"
+#include "chunk_writer.h"
 #include "command_error.h"
 #include "document_files.h"
 #include "platform/failure.h"
@@ -85,6 +87,74 @@ TEST_F(SafeWritesTest, ASaveKeepsWhatItReplaces) {
   if (root) EXPECT_EQ(status.st_uid, 4321u);
   EXPECT_FALSE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Ab12Cd")));
   EXPECT_TRUE(std::filesystem::exists(tree_.Native("data/user.xml.trl-Xy34Zw")));
+}
+
+// A text made in pieces arrives whole and in order, whatever the pieces' sizes against the writes
+// that gather them; a text whose making fails leaves the file as it was and nothing beside it.
+TEST_F(SafeWritesTest, ATextInPiecesReplacesAFileWhole) {
+  constexpr size_t kMiB = 1 << 20;
+  const std::vector<size_t> cases[] = {
+      {}, {5, 7, 11}, {kMiB - 3, 2, 1, 4}, {3, kMiB, 5}, {kMiB + 1, 2 * kMiB + 7, 9},
+  };
+  for (const auto& sizes : cases) {
+    std::string expected;
+    std::vector<std::string> pieces;
+    for (size_t size : sizes) {
+      std::string piece(size, '\0');
+      for (size_t i = 0; i < size; ++i)
+        piece[i] = static_cast<char>('a' + (expected.size() + i) % 23);
+      expected += piece;
+      pieces.push_back(std::move(piece));
+    }
+    ReplaceFileAtomically(tree_.Native("out.xml"),
+                          [&](const auto& put) {
+                            for (const std::string& piece : pieces) put(piece);
+                          },
+                          {});
+    ASSERT_EQ(Read("out.xml"), expected + "\n") << sizes.size() << " pieces";
+  }
+  tree_.AddFile("kept.xml", "old");
+  EXPECT_THROW(ReplaceFileAtomically(tree_.Native("kept.xml"),
+                                     [](const auto& put) {
+                                       put("<partial");
+                                       throw Failure(kOutOfMemory, "out of memory");
+                                     },
+                                     {}),
+               Failure);
+  EXPECT_EQ(Read("kept.xml"), "old");
+  for (const auto& entry : std::filesystem::directory_iterator(tree_.Native(""))) {
+    EXPECT_EQ(entry.path().string().find(".trl-"), std::string::npos) << entry.path();
+  }
+}
+
+// Chunks handed to the writing thread arrive in order, however the pieces fall against them; a
+// failed write is told at the end.
+TEST_F(SafeWritesTest, ChunksArriveInOrderAndAFailureIsTold) {
+  for (size_t chunkSize : {1, 7, 64, 1 << 16}) {
+    tree_.AddFile("chunks.txt", "");
+    int fd = ::open(tree_.Native("chunks.txt").c_str(), O_WRONLY | O_TRUNC);
+    ASSERT_GE(fd, 0);
+    std::string expected;
+    {
+      ChunkWriter writer(fd, chunkSize);
+      for (size_t size = 0; size < 300; size += 13) {
+        std::string piece(size, static_cast<char>('a' + size % 26));
+        writer.Put(piece);
+        expected += piece;
+      }
+      EXPECT_TRUE(writer.Finish());
+    }
+    ::close(fd);
+    EXPECT_EQ(Read("chunks.txt"), expected) << chunkSize;
+  }
+  int full = ::open("/dev/full", O_WRONLY);
+  ASSERT_GE(full, 0);
+  ChunkWriter writer(full, 4);
+  writer.Put("more than a chunk");
+  writer.Put("and more");
+  EXPECT_FALSE(writer.Finish());
+  EXPECT_EQ(errno, ENOSPC);
+  ::close(full);
 }
 
 // A second save of the same file waits until the first has replaced it.

@@ -59,6 +59,16 @@ TEST_F(SearchTest, RunRecordsWhatItsEntryAdmits) {
   for (const auto& [options, expected] : cases)
     EXPECT_EQ(Summary(*Run(options, fingerprint, applicationOptions), root), expected) << options;
   EXPECT_EQ(ValuesOf(*Run(walk("")), "//d", "d_id"), Words("1 2 3 4 5"));  // numbered from 1
+
+  // A writer is handed the document in place of its text.
+  Search search(fs::CreatePosixFileSystem({}));
+  search.Asynchronous(false);
+  std::string written;
+  search.ResultsWriter([&](const xml::Document& results) {
+    results.WriteXml([&](std::string_view piece) { written += piece; });
+  });
+  EXPECT_EQ(search.Start(Parse(walk(""))), "");
+  EXPECT_EQ(Summary(*Parse(written), root), std::get<1>(cases[0]));
 }
 
 // A report as its status or its path below `below`, then the counts of folders and files.

@@ -261,6 +261,10 @@ const ParseError& Document::LastParseError() const { return impl_->parseError; }
 
 std::string Document::Xml() const { return impl_->Wrap(impl_->doc).Xml(); }
 
+void Document::WriteXml(const std::function<void(std::string_view)>& out) const {
+  impl_->Wrap(impl_->doc).WriteXml(out);
+}
+
 Node Document::AsNode() { return impl_->Wrap(impl_->doc); }
 
 Node Document::DocumentElement() {

@@ -20,6 +20,18 @@ void Print(pugi::xml_node node, pugi::xml_node holder, pugi::xml_writer& out) {
   }
 }
 
+// Hands each piece the printer makes to a function.
+class PieceWriter final : public pugi::xml_writer {
+ public:
+  explicit PieceWriter(const std::function<void(std::string_view)>& out) : out_(out) {}
+  void write(const void* data, size_t size) override {
+    out_(std::string_view(static_cast<const char*>(data), size));
+  }
+
+ private:
+  const std::function<void(std::string_view)>& out_;
+};
+
 pugi::xml_node RequireElement(const Node& node) {
   pugi::xml_node element = Require(node);
   if (element.type() != pugi::node_element) Fail(kInvalidArgument, "Only elements have attributes");
@@ -279,6 +291,12 @@ void Node::SetText(std::string_view text) {
     FailOutOfMemory();
   }
   impl.TreeChanged();
+}
+
+void Node::WriteXml(const std::function<void(std::string_view)>& out) const {
+  pugi::xml_node node = Require(*this);
+  PieceWriter writer(out);
+  Print(node, document_->impl_->holder, writer);
 }
 
 std::string Node::Xml() const {

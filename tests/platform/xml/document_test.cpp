@@ -291,6 +291,9 @@ TEST(XmlDocumentTest, DetachedNodesStayOutOfSight) {
   EXPECT_EQ(doc.AsNode().GetElementsByTagName("m").size(), 1u);
   EXPECT_EQ(doc.AsNode().ChildNodes(), std::vector<Node>{root});
   EXPECT_EQ(doc.AsNode().Text() + doc.Xml(), "t<r><c id=\"1\">t<m/></c></r>");
+  std::string pieces;
+  doc.WriteXml([&](std::string_view piece) { pieces += piece; });
+  EXPECT_EQ(pieces, doc.Xml());
   EXPECT_EQ(detached.SelectNodes("//m").size(), 1u);
   EXPECT_EQ(detached.SelectSingleNode("."), detached);
   EXPECT_EQ(root.AppendChild(detached), detached);

@@ -5,11 +5,12 @@
 #include <vector>
 
 #include "platform/fs/file_system.h"
+#include "platform/fs/posix/folder_entries.h"
 #include "platform/fs/posix/folder_place.h"
 
 namespace trl::fs::posix {
 
-// One folder's entries as one readdir pass finds them, in the order it finds them.
+// One folder's entries as one pass over them finds them, in the order it finds them.
 struct FolderListing {
   struct SubFolder {
     std::shared_ptr<FolderPlace> place;
@@ -28,5 +29,7 @@ struct FolderListing {
 // differ from another's only in letter case. Touches nothing but `folder`'s fixed location, so any
 // thread may list.
 FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder);
+// The same from `entries`, opened on `folder` already.
+FolderListing ListFolder(const std::shared_ptr<const FolderPlace>& folder, FolderEntries& entries);
 
 }  // namespace trl::fs::posix

@@ -15,6 +15,10 @@ std::string FolderPlace::PathChild(std::string_view nativeName) const {
   return JoinPath(path_, NameFromNative(nativeName), '\\');
 }
 
+std::string_view FolderPlace::NativeName() const {
+  return std::string_view(native_).substr(native_.rfind('/') + 1);
+}
+
 bool FolderPlace::HasDosAttributes() const {
   if (!dosAttributes_ && dosParent_) dosAttributes_ = dosParent_->HasDosAttributes();
   if (!dosAttributes_) {

@@ -19,10 +19,15 @@ namespace trl::fs::posix {
 // each file) and whether its items carry DOS attributes, decided once per folder.
 class FolderPlace {
  public:
-  FolderPlace(std::string native, std::string path)
-      : native_(std::move(native)), path_(std::move(path)) {}
+  // `parent`, when given, is the folder this one was listed in.
+  FolderPlace(std::string native, std::string path,
+              std::shared_ptr<const FolderPlace> parent = nullptr)
+      : native_(std::move(native)), path_(std::move(path)), parent_(std::move(parent)) {}
 
   const std::string& Native() const { return native_; }
+  const std::shared_ptr<const FolderPlace>& Parent() const { return parent_; }
+  // The last name of Native().
+  std::string_view NativeName() const;
   const std::string& Path() const { return path_; }
   std::string NativeChild(std::string_view nativeName) const;
   std::string PathChild(std::string_view nativeName) const;
@@ -35,6 +40,7 @@ class FolderPlace {
  private:
   std::string native_;  // "/opt/Acme"
   std::string path_;    // "\opt\Acme"
+  std::shared_ptr<const FolderPlace> parent_;
   mutable std::optional<bool> dosAttributes_;
   std::shared_ptr<const FolderPlace> dosParent_;
 };

@@ -1,9 +1,60 @@
 #include "platform/fs/posix/listing_read_ahead.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <system_error>
 
 namespace trl::fs::posix {
+namespace {
+
+// The folders on the read-ahead's way down, kept open so that each subfolder is opened from its
+// parent: one name for the system to look up instead of every name of its path.
+class OpenFolders {
+ public:
+  OpenFolders() = default;
+  ~OpenFolders() { CloseAbove(0); }
+  OpenFolders(const OpenFolders&) = delete;
+  OpenFolders& operator=(const OpenFolders&) = delete;
+
+  // `folder`, opened from its parent when that is open. Folders opened after the parent are
+  // closed: a depth-first walk has left them.
+  FolderEntries Open(const FolderPlace& folder) {
+    const auto& parent = folder.Parent();
+    auto at = std::find_if(open_.rbegin(), open_.rend(),
+                           [&](const Held& held) { return parent && held.place == parent; });
+    CloseAbove(static_cast<size_t>(open_.rend() - at));
+    if (open_.empty()) return FolderEntries(folder.Native());
+    return FolderEntries(open_.back().descriptor, folder.NativeName());
+  }
+  // Keeps `folder` open for its subfolders.
+  void Keep(std::shared_ptr<const FolderPlace> folder, FolderEntries& entries) {
+    if (open_.size() < kMaxOpen) {
+      int descriptor = entries.Release();
+      if (descriptor >= 0) open_.push_back({std::move(folder), descriptor});
+    }
+  }
+
+ private:
+  // Deeper folders are opened by their paths: descriptors are a limited resource.
+  static constexpr size_t kMaxOpen = 32;
+
+  struct Held {
+    std::shared_ptr<const FolderPlace> place;
+    int descriptor;
+  };
+
+  void CloseAbove(size_t keep) {
+    while (open_.size() > keep) {
+      ::close(open_.back().descriptor);
+      open_.pop_back();
+    }
+  }
+
+  std::vector<Held> open_;
+};
+
+}  // namespace
 
 ListingReadAhead::~ListingReadAhead() {
   {
@@ -15,6 +66,7 @@ ListingReadAhead::~ListingReadAhead() {
 }
 
 FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder) {
+  if (auto held = TakeHeld(folder)) return std::move(*held);
   std::unique_lock lock(mutex_);
   if (!StartReader()) {
     lock.unlock();
@@ -22,16 +74,16 @@ FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder)
   }
   bool asked = false;
   for (;;) {
-    auto found = std::find_if(ready_.begin(), ready_.end(),
+    TakeOverReady();
+    auto found = std::find_if(held_.begin(), held_.end(),
                               [&](const Ready& ready) { return ready.folder == folder; });
-    if (found != ready_.end()) {
-      std::optional<FolderListing> listing = std::move(found->listing);
-      DropReady(found + 1);
-      if (readerIdle_ && BelowHalf()) work_.notify_one();
+    if (found != held_.end()) {
       lock.unlock();
-      return listing ? std::move(*listing) : ListFolder(folder);
+      return *TakeHeld(folder);
     }
     if (!asked) {
+      // Everything held comes before `folder` in walk order, or belongs to a walk left behind.
+      held_.clear();
       ReadNext(folder);
       asked = true;
     }
@@ -41,9 +93,36 @@ FolderListing ListingReadAhead::Take(const std::shared_ptr<FolderPlace>& folder)
   }
 }
 
+std::optional<FolderListing> ListingReadAhead::TakeHeld(
+    const std::shared_ptr<FolderPlace>& folder) {
+  auto found = std::find_if(held_.begin(), held_.end(),
+                            [&](const Ready& ready) { return ready.folder == folder; });
+  if (found == held_.end()) return std::nullopt;
+  std::optional<FolderListing> listing = std::move(found->listing);
+  held_.erase(held_.begin(), found + 1);
+  return listing ? std::move(*listing) : ListFolder(folder);
+}
+
+void ListingReadAhead::TakeOverReady() {
+  for (Ready& ready : ready_) held_.push_back(std::move(ready));
+  DropReady(ready_.end());
+  for (auto& files : freed_) toFree_.push_back(std::move(files));
+  freed_.clear();
+  if (readerIdle_) work_.notify_one();
+}
+
 void ListingReadAhead::Recycle(Collection<File> files) {
-  std::lock_guard lock(mutex_);
-  if (reader_.joinable()) toFree_.push_back(std::move(files));
+  freed_.push_back(std::move(files));
+  // Handed over now and then even when the walk finds its listings held.
+  if (freed_.size() >= maxReadyFolders_) {
+    std::lock_guard lock(mutex_);
+    if (!reader_.joinable()) {
+      freed_.clear();
+      return;
+    }
+    for (auto& batch : freed_) toFree_.push_back(std::move(batch));
+    freed_.clear();
+  }
 }
 
 void ListingReadAhead::ReadNext(const std::shared_ptr<FolderPlace>& folder) {
@@ -80,11 +159,8 @@ bool ListingReadAhead::HasRoom() const {
   return ready_.size() < maxReadyFolders_ && readyEntries_ < maxReadyEntries_;
 }
 
-bool ListingReadAhead::BelowHalf() const {
-  return ready_.size() <= maxReadyFolders_ / 2 && readyEntries_ <= maxReadyEntries_ / 2;
-}
-
 void ListingReadAhead::Run() {
+  OpenFolders open;
   std::unique_lock lock(mutex_);
   for (;;) {
     readerIdle_ = true;
@@ -95,13 +171,20 @@ void ListingReadAhead::Run() {
     toRead_.pop_back();
     reading_ = folder;
     readingDropped_ = false;
+    // A few folders' files at a time, about as many as each listing makes: freed in step with
+    // the making, their memory is taken again from the allocator's fastest caches.
     std::vector<Collection<File>> toFree;
-    toFree.swap(toFree_);
+    for (int i = 0; i < 2 && !toFree_.empty(); ++i) {
+      toFree.push_back(std::move(toFree_.back()));
+      toFree_.pop_back();
+    }
     lock.unlock();
     toFree.clear();
     std::optional<FolderListing> listing;
     try {
-      listing = ListFolder(folder);
+      FolderEntries entries = open.Open(*folder);
+      listing = ListFolder(folder, entries);
+      if (!listing->subFolders.empty()) open.Keep(folder, entries);
     } catch (const std::exception&) {
       // Left to the walk's thread, which lists the folder itself and meets the failure there.
     }

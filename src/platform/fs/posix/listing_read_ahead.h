@@ -20,6 +20,8 @@ namespace trl::fs::posix {
 // what the walk does with the entries. A walk that passes over a folder (a mask turned it away)
 // or starts elsewhere drops what was read for the folders it left behind; the read-ahead then
 // carries on from where the walk is. Only a bounded number of listings wait at any time.
+// The walk takes over all listings that are ready at once and hands back files in batches: a lock
+// (and a wake-up) per folder cost both threads more than listing a small folder does.
 class ListingReadAhead {
  public:
   // At most `maxReadyFolders` listings, holding `maxReadyEntries` entries in all, wait at a time.
@@ -34,7 +36,7 @@ class ListingReadAhead {
   // the read-ahead thread, which goes on with its subfolders). Called by one thread only.
   FolderListing Take(const std::shared_ptr<FolderPlace>& folder);
   // Takes back files a listing made, to be freed on the read-ahead thread: freeing them costs the
-  // walk's thread about as much as making them cost this one.
+  // walk's thread about as much as making them cost this one. Called by the thread that takes.
   void Recycle(Collection<File> files);
 
  private:
@@ -48,10 +50,13 @@ class ListingReadAhead {
   bool StartReader();
   void Run();
   bool HasRoom() const;
-  bool BelowHalf() const;
   // Makes `folder` the next listing to read, dropping what was read or is being read before it.
   void ReadNext(const std::shared_ptr<FolderPlace>& folder);
   void DropReady(std::deque<Ready>::iterator end);
+  // The listing of `folder` when the walk holds it, dropping those before it; none otherwise.
+  std::optional<FolderListing> TakeHeld(const std::shared_ptr<FolderPlace>& folder);
+  // Takes over every ready listing and hands over the files to free (under the lock).
+  void TakeOverReady();
 
   const size_t maxReadyFolders_;
   const size_t maxReadyEntries_;
@@ -68,6 +73,10 @@ class ListingReadAhead {
   bool walkWaiting_ = false;
   bool stop_ = false;
   std::thread reader_;  // started by the first Take
+
+  // The walk's own, touched without the lock.
+  std::deque<Ready> held_;               // ready listings taken over, in walk order
+  std::vector<Collection<File>> freed_;  // files to hand over for freeing
 };
 
 }  // namespace trl::fs::posix

@@ -2,10 +2,9 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
-#include <memory>
 
 #include "platform/fs/component_path.h"
+#include "platform/fs/posix/folder_entries.h"
 #include "platform/fs/posix/sys_calls.h"
 #include "platform/text.h"
 
@@ -35,20 +34,11 @@ const NameResolver::Listing& NameResolver::ListingOf(const std::string& director
   auto [entry, added] = listings_.try_emplace(directory);
   Listing& listing = entry->second;
   if (!added) return listing;
-  std::unique_ptr<DIR, int (*)(DIR*)> stream(OpenDirectory(directory), closedir);
-  if (!stream) {
-    listing.error = errno;
-    return listing;
-  }
-  for (;;) {
-    errno = 0;  // readdir tells an error from the end only through errno
-    const dirent* item = readdir(stream.get());
-    if (item == nullptr) break;
-    if (std::strcmp(item->d_name, ".") != 0 && std::strcmp(item->d_name, "..") != 0) {
-      listing.names.emplace_back(item->d_name);
-    }
-  }
-  listing.error = errno;
+  FolderEntries entries(directory);
+  std::string_view name;
+  unsigned char type = 0;
+  while (entries.Next(name, type)) listing.names.emplace_back(name);
+  listing.error = entries.Error();
   std::sort(listing.names.begin(), listing.names.end());
   for (size_t i = 0; i < listing.names.size(); ++i) {
     listing.firstByLowerName.try_emplace(LowerCase(listing.names[i]), i);

@@ -12,7 +12,7 @@
 
 namespace trl::fs::posix {
 
-// A folder of a POSIX file system, listed in one readdir pass on first use of Files or SubFolders.
+// A folder of a POSIX file system, listed in one pass on first use of Files or SubFolders.
 // A listing that fails is not tried again: both fail alike.
 class PosixFolder final : public Folder {
  public:

@@ -19,6 +19,8 @@ namespace {
 
 thread_local SysCallCounts counts;
 
+constexpr int kFolderFlags = O_RDONLY | O_NONBLOCK | O_DIRECTORY | O_CLOEXEC;
+
 // The folder `folder` names, opened a few names at a time from "/" (or the working folder), each
 // step shorter than PATH_MAX: the system refuses a longer path at once, yet folders may lie
 // deeper. -1 with errno set when it cannot be.
@@ -126,21 +128,17 @@ int RealPath(const std::string& path, std::string& out) {
   return 0;
 }
 
-DIR* OpenDirectory(const std::string& path) {
+int OpenFolder(const std::string& path) {
   ++counts.opendir;
-  DIR* directory = ::opendir(path.empty() ? "." : path.c_str());
-  if (directory != nullptr || errno != ENAMETOOLONG) return directory;
-  int descriptor = AtLongPath(path, [](int folder, const char* name) {
-    return ::openat(folder, name, O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  });
-  if (descriptor < 0) return nullptr;
-  directory = ::fdopendir(descriptor);
-  if (directory == nullptr) {
-    int error = errno;
-    ::close(descriptor);
-    errno = error;
-  }
-  return directory;
+  return Reaching(
+      path.empty() ? std::string(".") : path,
+      [](const std::string& at) { return ::open(at.c_str(), kFolderFlags); },
+      [](int folder, const char* name) { return ::openat(folder, name, kFolderFlags); });
+}
+
+int OpenFolderAt(int parent, const std::string& name) {
+  ++counts.opendir;
+  return ::openat(parent, name.c_str(), kFolderFlags);
 }
 
 int OpenFile(const std::string& path, int flags) {

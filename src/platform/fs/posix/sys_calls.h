@@ -1,6 +1,5 @@
 #pragma once
 
-#include <dirent.h>
 #include <sys/stat.h>
 
 #include <cstdint>
@@ -33,8 +32,10 @@ int FileSystemType(const std::string& path, int64_t& type);
 std::string GetExtendedAttribute(const std::string& path, const char* name);
 // The path with every link, "." and ".." resolved, from "/".
 int RealPath(const std::string& path, std::string& out);
-// nullptr with errno set on failure; an empty path is the working directory.
-DIR* OpenDirectory(const std::string& path);
+// A descriptor of the folder to list, or -1 with errno set; an empty path is the working folder.
+int OpenFolder(const std::string& path);
+// The folder `name` of the open folder `parent`, the same way.
+int OpenFolderAt(int parent, const std::string& name);
 // open(2): a descriptor, or -1 with errno set.
 int OpenFile(const std::string& path, int flags);
 
