@@ -261,12 +261,17 @@ TEST_F(CommandsTest, CancelledRunNeverTouchesTheUserData) {
 TEST(InterruptGuardTest, ARunThatDoesNotStopInTimeIsNotWaitedFor) {
   GTEST_FLAG_SET(death_test_style, "threadsafe");
   auto interrupted = [](bool stops) {
-    InterruptGuard guard([] { return std::string("gave up"); }, std::chrono::milliseconds(20));
-    std::raise(SIGINT);
-    if (stops) InterruptGuard::Stopped();
-    std::this_thread::sleep_for(std::chrono::seconds(stops ? 0 : 30));
-    std::exit(InterruptGuard::Requested() ? 7 : 0);
+    bool requested = false;
+    {
+      InterruptGuard guard([] { return std::string("gave up"); }, std::chrono::milliseconds(20));
+      std::raise(SIGINT);
+      if (stops) InterruptGuard::Stopped();
+      std::this_thread::sleep_for(std::chrono::seconds(stops ? 0 : 30));
+      requested = InterruptGuard::Requested();
+    }
+    std::exit(requested ? 7 : 0);
   };
+
   EXPECT_EXIT(interrupted(false), ::testing::ExitedWithCode(kExitInterrupted),
               "^trllocator: gave up\n$");
   EXPECT_EXIT(interrupted(true), ::testing::ExitedWithCode(7), "^$");
