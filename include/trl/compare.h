@@ -109,6 +109,9 @@ class Compare : public Worker {
   void FillRecordset(size_t files);
   // Starts reading ahead the candidates of `applications`, planned as the match will test them.
   void StartReadAhead(const std::vector<xml::Node>& applications);
+  // The same before the fingerprint is prepared, when the local-file index builds without a
+  // failure: the threads then hash while this one writes the fingerprint's bit values.
+  void StartReadAheadEarly();
   void StopReadAhead();
   // Plans the reads of the next few fingerprint files; false once all are planned.
   bool PlanMoreReads();
@@ -188,6 +191,7 @@ class Compare : public Worker {
   std::unordered_map<std::string, std::unique_ptr<LocalFileFacts>> filesSeen_;
 
   unsigned readThreads_;
+  bool indexBuiltEarly_ = false;  // rsLocalFiles was filled in Start, without a report
   struct ReadPlan;
   std::unique_ptr<ReadPlan> readPlan_;
   // Reads files of filesSeen_, so it goes first.

@@ -70,18 +70,21 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
   objResultsDOM = std::make_shared<xml::Document>();
   on([&] { objResultsDOM->SetDocumentElement(objResultsDOM->CreateElement(vocab::results_root)); });
   lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
-  on([&] { UpgradeFingerprintData(*objFingerprintDOM); });
   e_a_total = e_a_count = e_match_count = 0;
   StopReadAhead();
   rsLocalFiles.reset();
+  indexBuiltEarly_ = false;
   copiesById_.clear();
   knownCopies_.clear();
   filesSeen_.clear();
+  StartReadAheadEarly();
+  on([&] { UpgradeFingerprintData(*objFingerprintDOM); });
 }
 
 void Compare::RunBody() {
-  // Each run sees the disk as it is now, not as an earlier run of this instance found it.
-  if (objFSO) objFSO->Forget();
+  // Each run sees the disk as it is now, not as an earlier run of this instance found it (one
+  // that began to read ahead in Start looked at it then).
+  if (objFSO && !indexBuiltEarly_) objFSO->Forget();
   Match();
 }
 
@@ -97,7 +100,7 @@ void Compare::Match() {
   if (files != 0) {
     BeginRun(on);
     FillRecordset(files);
-    StartReadAhead(applications);
+    if (!readAhead_) StartReadAhead(applications);
     for (const xml::Node& a : applications) {
       YieldIfAsynchronous(on);
       if (status_ == kStatusCancelled) break;
@@ -383,6 +386,7 @@ void Compare::ReleaseDocuments() {
   objResultsDOM.reset();
   StopReadAhead();
   rsLocalFiles.reset();
+  indexBuiltEarly_ = false;
   copiesById_.clear();
   knownCopies_.clear();
   filesSeen_.clear();

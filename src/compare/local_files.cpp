@@ -20,8 +20,11 @@ namespace trl {
 
 using compare::kClass;
 
-void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
-  OnError on{kClass, compare::kFillRecordsetLabel};
+namespace {
+
+// Fills the index, each step run through `on`, which reports a failure or passes it on.
+template <class Steps>
+void Fill(xml::Document& localFiles, LocalFileIndex* index, const Steps& on) {
   std::vector<xml::Node> computers;
   on([&] {
     if (!localFiles.DocumentElement()) Fail(kObjectNotSet);
@@ -63,7 +66,26 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
   }
 }
 
+}  // namespace
+
+void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
+  Fill(localFiles, index, OnError{kClass, compare::kFillRecordsetLabel});
+}
+
+bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
+  try {
+    Fill(localFiles, &index, [](auto&& step) {
+      step();
+      return true;
+    });
+  } catch (...) {
+    return false;
+  }
+  return true;
+}
+
 void Compare::FillRecordset(size_t files) {
+  if (indexBuiltEarly_) return;
   OnError on{kClass, compare::kFillRecordsetLabel};
   rsLocalFiles.reset();
   on([&] {

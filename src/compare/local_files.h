@@ -10,5 +10,7 @@ class LocalFileIndex;
 // each `d` of each `m` of every `c`, numbered from 1. A missing index or unreadable value is
 // reported (as Compare's FillRecordset) and filling goes on.
 void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index);
+// The same without a report: false, with the index partly filled, at the first failure.
+bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index);
 
 }  // namespace trl

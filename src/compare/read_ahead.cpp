@@ -48,11 +48,12 @@ bool ReadAhead::Widen(Planned& planned, unsigned wanted) {
   return true;
 }
 
-void ReadAhead::KeepAhead() {
+void ReadAhead::KeepAhead(size_t files) {
+  if (files == 0) files = window_;
   while (planning_) {
     {
       std::lock_guard lock(mutex_);
-      if (waiting_.size() >= window_) return;
+      if (waiting_.size() >= files) return;
     }
     planning_ = planMore_();
   }

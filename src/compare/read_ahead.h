@@ -53,8 +53,9 @@ class ReadAhead {
   // planned has been taken now, so that the plan can be let go.
   std::string Take(Planned& planned, int kind, bool& exhausted);
 
-  // Plans ahead up to the window; Compare calls it as it moves on.
-  void KeepAhead();
+  // Plans ahead until `files` planned files (the window unless given) wait for a thread; Compare
+  // calls it as it moves on.
+  void KeepAhead(size_t files = 0);
 
  private:
   void Work();

@@ -7,9 +7,11 @@
 #include "compare/file_facts.h"
 #include "compare/fingerprint_file.h"
 #include "compare/local_file_index.h"
+#include "compare/local_files.h"
 #include "compare/read_ahead.h"
 #include "compare/read_plan.h"
 #include "frame/attributes.h"
+#include "frame/every_element.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
 #include "platform/fs/file_system.h"
@@ -23,6 +25,8 @@ namespace {
 // Files planned but begun by no thread yet: enough to keep every thread busy while the match
 // moves through files it need not read, few enough to hold little.
 constexpr size_t kReadWindow = 128;
+// Files planned before the fingerprint is prepared: enough to keep every thread busy meanwhile.
+constexpr size_t kEarlyWindow = 4096;
 // Fingerprint files planned at a time, so that a large application is planned as it is matched.
 constexpr int kPlanStep = 16;
 
@@ -36,6 +40,26 @@ void Compare::StartReadAhead(const std::vector<xml::Node>& applications) {
   readAhead_ = std::make_unique<ReadAhead>(*objSchema, readThreads_, kReadWindow,
                                            [this] { return PlanMoreReads(); });
   readAhead_->KeepAhead();
+}
+
+void Compare::StartReadAheadEarly() {
+  if (readThreads_ == 0 || !objFSO || !objSchema) return;
+  std::vector<xml::Node> applications;
+  auto index = std::make_unique<LocalFileIndex>();
+  try {
+    applications = EveryElement(*objFingerprintDOM, vocab::a);
+    size_t files = EveryElement(*objLocalFilesDOM, vocab::f).size();
+    if (files == 0) return;
+    index->Reserve(files);
+    if (!TryFillLocalFileIndex(*objLocalFilesDOM, *index)) return;
+  } catch (...) {
+    return;  // the run meets the failure again, and reports it
+  }
+  objFSO->Forget();
+  rsLocalFiles = std::move(index);
+  indexBuiltEarly_ = true;
+  StartReadAhead(applications);
+  readAhead_->KeepAhead(kEarlyWindow);
 }
 
 void Compare::StopReadAhead() {
