@@ -215,6 +215,24 @@ TEST_F(CompareTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
   }
 }
 
+// A local file that cannot be read into the index is reported while the run fills it, after what
+// preparing the fingerprint reported, however many threads read ahead; the others are matched.
+TEST_F(CompareTest, IndexFailuresAreReportedInTheirPlaceWhateverReadsAhead) {
+  std::string local = LocalFiles({{"\\", {"data.bin"}}});
+  local.insert(local.find("</d>"), "<f f_text='nameless'/>");
+  for (unsigned threads : {0u, 2u}) {
+    SwitchedCompare compare(true, std::make_unique<NamedFiles>(), false);
+    compare.Asynchronous(false);
+    compare.ReadThreads(threads);
+    std::string results = compare.Start(nullptr, Parse(local), Parse(OneFileFingerprint("2/x/8")));
+    SCOPED_TRACE(threads);
+    EXPECT_EQ(Summary(results), "c=localhost d=\\ a=1^1 v 1/1/1");
+    std::vector<std::string> where;
+    for (const ReportedEvent& e : EventsIn(*Parse(results))) where.push_back(e.procedure);
+    EXPECT_THAT(where, ElementsAre("UpgradeFingerprintData", "FillRecordset", "MatchFile"));
+  }
+}
+
 TEST_F(CompareTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFits) {
   std::string localFiles =
       "<trl_applicationdata>" +
