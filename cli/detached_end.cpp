@@ -21,10 +21,26 @@ void PassOnInterrupt(int, siginfo_t* info, void*) {
   if (info->si_code == SI_USER || info->si_code == SI_QUEUE) ::kill(childProcess, SIGINT);
 }
 
+// Told in place of an exit code: the child ended by Ctrl-C, and the parent ends the same way.
+constexpr unsigned char kEndedByInterrupt = 255;
+
 void TellParent(int code) {
   if (parentPipe < 0) return;
   unsigned char byte = static_cast<unsigned char>(code);
   [[maybe_unused]] ssize_t written = ::write(parentPipe, &byte, 1);
+}
+
+// Ctrl-C where no command handles it ends the child as it would end any program, once the parent
+// knows it need not wait.
+void EndByInterrupt(int) {
+  TellParent(kEndedByInterrupt);
+  std::signal(SIGINT, SIG_DFL);
+  std::raise(SIGINT);
+}
+
+void EndAsInterrupted() {
+  std::signal(SIGINT, SIG_DFL);
+  std::raise(SIGINT);
 }
 
 // The parent ends as the child did: with its code, or by the same signal.
@@ -58,6 +74,9 @@ int RunWithDetachedEnd(const std::function<int()>& program) {
     parentPipe = ends[1];
     ::prctl(PR_SET_PDEATHSIG, SIGKILL);
     if (::getppid() != parent) ::_exit(1);  // the parent ended before the setting took
+    struct sigaction inherited {};
+    sigaction(SIGINT, nullptr, &inherited);
+    if (inherited.sa_handler == SIG_DFL) std::signal(SIGINT, EndByInterrupt);
     return program();
   }
   ::close(ends[1]);
@@ -72,7 +91,10 @@ int RunWithDetachedEnd(const std::function<int()>& program) {
   do {
     got = ::read(ends[0], &code, 1);
   } while (got < 0 && errno == EINTR);
-  if (got == 1) ::_exit(code);
+  if (got == 1) {
+    if (code == kEndedByInterrupt) EndAsInterrupted();
+    ::_exit(code);
+  }
   return ChildEnding(child);
 }
 

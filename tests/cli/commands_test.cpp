@@ -289,6 +289,9 @@ TEST(DetachedEndTest, TheProgramEndsAsItsChildDoes) {
   EXPECT_EXIT(std::exit(RunWithDetachedEnd([] { return 4; })), ::testing::ExitedWithCode(4), "");
   EXPECT_EXIT(std::exit(RunWithDetachedEnd([] { return std::raise(SIGTERM); })),
               ::testing::KilledBySignal(SIGTERM), "");
+  // Ctrl-C that no command handles: the parent does not wait for the child to be gone.
+  EXPECT_EXIT(std::exit(RunWithDetachedEnd([] { return std::raise(SIGINT); })),
+              ::testing::KilledBySignal(SIGINT), "");
 }
 
 TEST_F(CommandsTest, TableTellsWhatChangedSinceTheLastRun) {
