@@ -18,23 +18,9 @@ build_dir=$(realpath -m "${1:-build}")
 work_dir=$(realpath -m "${2:-/tmp/trl-cancel-bench}")
 trials=${TRIALS:-20}
 format=${FORMAT:-table}
-trllocator="$build_dir/trllocator"
-tree=/tmp/trl-search-bench/tree-1000000
-data=/tmp/trl-compare-bench/apps-10000
-for tool in "$trllocator" "$build_dir/bench/make_tree" "$build_dir/bench/make_compare_data"; do
-  [[ -x $tool ]] || { echo "missing $tool: build it first" >&2; exit 1; }
-done
-mkdir -p "$work_dir" "$(dirname "$tree")" "$(dirname "$data")"
-if [[ ! -f $tree.done ]]; then
-  rm -rf "$tree"
-  "$build_dir/bench/make_tree" "$tree" 1000000 >&2
-  touch "$tree.done"
-fi
-if [[ ! -f $data.done ]]; then
-  rm -rf "$data"
-  "$build_dir/bench/make_compare_data" "$data" 10000 >/dev/null
-  touch "$data.done"
-fi
+source "$(dirname "$0")/scale_inputs.sh"
+scale_inputs "$build_dir" 10000
+mkdir -p "$work_dir"
 find "$tree" "$data/disk" >/dev/null
 
 run=("$trllocator" locate "$tree" "$data/disk" --fingerprint "$data/fingerprint.xml"

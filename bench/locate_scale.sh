@@ -15,25 +15,10 @@ set -euo pipefail
 build_dir=$(realpath -m "${1:-build}")
 work_dir=$(realpath -m "${2:-/tmp/trl-locate-bench}")
 runs=${RUNS:-2}
-trllocator="$build_dir/trllocator"
-tree=/tmp/trl-search-bench/tree-1000000
-data=/tmp/trl-compare-bench/apps-10000
-for tool in "$trllocator" "$build_dir/bench/make_tree" "$build_dir/bench/make_compare_data"; do
-  [[ -x $tool ]] || { echo "missing $tool: build it first" >&2; exit 1; }
-done
+source "$(dirname "$0")/scale_inputs.sh"
+scale_inputs "$build_dir" 10000
 [[ -x /usr/bin/time ]] || { echo "/usr/bin/time is not installed (apt-get install time)" >&2; exit 1; }
-mkdir -p "$work_dir" "$(dirname "$tree")" "$(dirname "$data")"
-
-if [[ ! -f $tree.done ]]; then
-  rm -rf "$tree"
-  "$build_dir/bench/make_tree" "$tree" 1000000 >&2
-  touch "$tree.done"
-fi
-if [[ ! -f $data.done ]]; then
-  rm -rf "$data"
-  "$build_dir/bench/make_compare_data" "$data" 10000 >/dev/null
-  touch "$data.done"
-fi
+mkdir -p "$work_dir"
 
 entry() {
   printf '<d d_id="%s" d_text="%s" d_search="1" d_search_recurse="1"><d_search_mask/></d>' "$1" "${2//\//\\}"

@@ -17,23 +17,9 @@ build_dir=$(realpath -m "${1:-build}")
 work_dir=$(realpath -m "${2:-/tmp/trl-rescan-bench}")
 apps=${APPS:-1000}
 runs=${RUNS:-3}
-trllocator="$build_dir/trllocator"
-tree=/tmp/trl-search-bench/tree-1000000
-data=/tmp/trl-compare-bench/apps-$apps
-for tool in "$trllocator" "$build_dir/bench/make_tree" "$build_dir/bench/make_compare_data"; do
-  [[ -x $tool ]] || { echo "missing $tool: build it first" >&2; exit 1; }
-done
-mkdir -p "$work_dir" "$(dirname "$tree")" "$(dirname "$data")"
-if [[ ! -f $tree.done ]]; then
-  rm -rf "$tree"
-  "$build_dir/bench/make_tree" "$tree" 1000000 >&2
-  touch "$tree.done"
-fi
-if [[ ! -f $data.done ]]; then
-  rm -rf "$data"
-  "$build_dir/bench/make_compare_data" "$data" "$apps" >/dev/null
-  touch "$data.done"
-fi
+source "$(dirname "$0")/scale_inputs.sh"
+scale_inputs "$build_dir" "$apps"
+mkdir -p "$work_dir"
 cache="$work_dir/properties.sqlite"
 rm -f "$cache" "$cache"-*
 find "$tree" "$data/disk" >/dev/null  # a warm disk for every command
