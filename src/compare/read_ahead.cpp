@@ -41,11 +41,9 @@ std::shared_ptr<ReadAhead::Planned> ReadAhead::Plan(const fs::File& file, unsign
   return planned;
 }
 
-bool ReadAhead::Widen(Planned& planned, unsigned wanted) {
+void ReadAhead::Widen(Planned& planned, unsigned wanted) {
   std::lock_guard lock(mutex_);
-  if (planned.state_ != Planned::State::kWaiting) return false;
-  planned.wanted_ |= wanted;
-  return true;
+  if (planned.state_ == Planned::State::kWaiting) planned.wanted_ |= wanted;
 }
 
 void ReadAhead::KeepAhead(size_t files) {

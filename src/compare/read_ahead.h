@@ -44,8 +44,8 @@ class ReadAhead {
   // Plans the reading of `file`, which must outlive this object, for the kinds `wanted` (a set of
   // bits 1 << kind). Called on Compare's thread in the order it will ask for the values.
   std::shared_ptr<Planned> Plan(const fs::File& file, unsigned wanted);
-  // Adds kinds to a plan no thread has begun; false when it is too late for that.
-  bool Widen(Planned& planned, unsigned wanted);
+  // Adds kinds to a plan no thread has begun; does nothing to one already begun.
+  void Widen(Planned& planned, unsigned wanted);
 
   // The value of the kind (kVersion or kDigest) of a planned file: as a worker read it, once it
   // has; read on this thread when no worker has begun it; raises the failure reading it gave.

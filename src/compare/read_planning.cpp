@@ -128,12 +128,16 @@ void Compare::PlanPathReads(const std::string& path, unsigned wanted) {
   if (facts.version.Settled()) wanted &= ~(1u << ReadAhead::kVersion);
   if (facts.digest.Settled()) wanted &= ~(1u << ReadAhead::kDigest);
   if (wanted == 0) return;
-  if (facts.planned && readAhead_->Widen(*facts.planned, wanted)) return;
+  if (facts.planned) {
+    // Too late when a thread has begun it: the match then reads the kind added itself.
+    readAhead_->Widen(*facts.planned, wanted);
+    return;
+  }
   try {
     if (!facts.exists.Get([&] { return objFSO->FileExists(path); })) return;
     const fs::File* file = facts.file.Get([&] { return objFSO->GetFile(path); }).get();
     if (!file || !file->OpensOnAnyThread()) return;
-    if (!facts.planned) facts.planned = readAhead_->Plan(*file, wanted);
+    facts.planned = readAhead_->Plan(*file, wanted);
   } catch (...) {
     // Kept by the facts, and reported when the match asks.
   }
