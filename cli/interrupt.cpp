@@ -24,7 +24,7 @@ struct sigaction previous {};
 
 std::mutex mutex;
 std::condition_variable changed;
-bool stopped = false;  // the run stopped, or the guard goes away
+bool stopped = false;  // the guard goes away: the run it guards has ended
 
 void OnInterrupt(int) {
   if (interrupts.fetch_add(1) > 0) EndFromSignalHandler(kExitInterrupted);
@@ -33,6 +33,14 @@ void OnInterrupt(int) {
     char byte = 1;
     [[maybe_unused]] ssize_t written = ::write(alarmPipe[1], &byte, 1);
   }
+}
+
+void Stopped() {
+  {
+    std::lock_guard lock(mutex);
+    stopped = true;
+  }
+  changed.notify_all();
 }
 
 }  // namespace
@@ -66,14 +74,6 @@ InterruptGuard::~InterruptGuard() {
 }
 
 bool InterruptGuard::Requested() { return interrupts.load() > 0; }
-
-void InterruptGuard::Stopped() {
-  {
-    std::lock_guard lock(mutex);
-    stopped = true;
-  }
-  changed.notify_all();
-}
 
 void InterruptGuard::Watch() {
   char byte = 0;

@@ -24,8 +24,6 @@ class InterruptGuard {
 
   // Whether Ctrl-C was pressed since the guard was made.
   static bool Requested();
-  // Tells that the run has stopped: from now on the process is not ended for it.
-  static void Stopped();
 
  private:
   void Watch();

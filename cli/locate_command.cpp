@@ -152,7 +152,7 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
     int status = Attribute(update, vocab::e_status);
     if (mode >= 0) stage = mode;
     if (status == kStatusCancelled || (mode == Locate::kFinished && status == kStatusComplete)) {
-      // Not told to the guard: the stage still gives back its documents before the loop ends,
+      // The guard's grace still runs: the stage gives back its documents before the loop ends,
       // which at scale takes longer than a person waits after Ctrl-C.
       ended = true;
       outcome.complete = status == kStatusComplete;
