@@ -146,7 +146,8 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
   auto cancelIfAsked = [&] {
     if (InterruptGuard::Requested() && !ended) locate.Cancel();
   };
-  locate.OnStatusUpdate([&](const std::string& update, const std::string& results) {
+  // The results are taken as a document: their text is made once, at the end, not at every report.
+  locate.OnStatusDocument([&](const std::string& update, const xml::DocumentPtr& results, bool) {
     progress.Update(update);
     int mode = Attribute(update, vocab::e_mode);
     int status = Attribute(update, vocab::e_status);
@@ -158,7 +159,7 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
       outcome.complete = status == kStatusComplete;
       outcome.cancelled = status == kStatusCancelled;
       outcome.stage = mode;
-      outcome.results = results;
+      if (results) outcome.results = results->Xml();
     }
     cancelIfAsked();
   });
@@ -178,7 +179,7 @@ Outcome RunAsynchronously(Locate& locate, const Documents& documents, int16_t fi
   locate.Start(documents.searchOptions, documents.applicationOptions, filter, documents.fingerprint,
                documents.userData);
   EventLoop::Current().RunUntil([&] { return ended; });
-  locate.OnStatusUpdate(nullptr);
+  locate.OnStatusDocument(nullptr);
   locate.OnProgressUpdate(nullptr);
   if (InterruptGuard::Requested() && !outcome.cancelled) {
     outcome.cancelled = true;

@@ -64,7 +64,8 @@ class Compare : public Worker {
  protected:
   void RunBody() override;
   std::string ResultText() override;
-  std::string ResultsXml() override;
+  xml::DocumentPtr ResultsDocument() override;
+  bool OwnsResults() const override { return true; }
   void AddStatusCounters(xml::Node e) override;
   void ReleaseDocuments() override;
 

@@ -34,7 +34,7 @@ class Filter : public Worker {
  protected:
   void RunBody() override;
   std::string ResultText() override;
-  std::string ResultsXml() override;
+  xml::DocumentPtr ResultsDocument() override;
   void AddStatusCounters(xml::Node e) override;
   void ReleaseDocuments() override;
 

@@ -65,7 +65,7 @@ class Locate : public Worker {
  protected:
   void RunBody() override;
   std::string ResultText() override;
-  std::string ResultsXml() override;
+  xml::DocumentPtr ResultsDocument() override;
   void AddStatusCounters(xml::Node) override {}
   void ReleaseDocuments() override;
   bool YieldsInStart() const override { return false; }
@@ -91,7 +91,7 @@ class Locate : public Worker {
   void Finalise();
 
   void StatusUpdate(Stage& stage, const std::string& strUpdateXML,
-                    const std::string& strResultsXML);
+                    const xml::DocumentPtr& stageResults, bool handedOver);
   void ProgressUpdate(const Stage& stage, const std::string& strUpdateXML);
   // Moves copies of the events recorded in a stage's results into the gathered events.
   void AddEvents(std::string_view stageName, xml::Document& results, xml::Document& eventsDocument);
@@ -112,7 +112,8 @@ class Locate : public Worker {
   xml::DocumentPtr searchOptions_, applicationOptions_, fingerprint_, userData_;
   xml::DocumentPtr searchResults_, compareResults_, filterResults_, mergeResults_;
   xml::DocumentPtr progressDocument_, events_;
-  xml::Document* reported_ = nullptr;  // the results StatusUpdate carries: search's, then merge's
+  // The field whose results StatusUpdate carries: search's, then merge's.
+  const xml::DocumentPtr* reported_ = nullptr;
 };
 
 }  // namespace trl

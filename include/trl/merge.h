@@ -33,7 +33,7 @@ class Merge : public Worker {
  protected:
   void RunBody() override;
   std::string ResultText() override;
-  std::string ResultsXml() override;
+  xml::DocumentPtr ResultsDocument() override;
   void AddStatusCounters(xml::Node e) override;
   void ReleaseDocuments() override;
 

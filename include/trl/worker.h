@@ -30,6 +30,12 @@ class Worker {
   using StatusUpdateHandler =
       std::function<void(const std::string& strUpdateXML, const std::string& strResultsXML)>;
   using ProgressUpdateHandler = std::function<void(const std::string& strUpdateXML)>;
+  // StatusUpdate with the results document itself instead of its text, for a host that relays the
+  // results or needs their text only at the end. `handedOver` is true at the last report of a run
+  // when the document is the worker's own: the worker lets go of it right after, so the handler
+  // may keep it instead of a copy.
+  using StatusDocumentHandler = std::function<void(
+      const std::string& strUpdateXML, const xml::DocumentPtr& results, bool handedOver)>;
 
   virtual ~Worker();
   Worker(const Worker&) = delete;
@@ -43,6 +49,7 @@ class Worker {
 
   // Events, raised only while Asynchronous is true.
   void OnStatusUpdate(StatusUpdateHandler handler) { statusUpdate_ = std::move(handler); }
+  void OnStatusDocument(StatusDocumentHandler handler) { statusDocument_ = std::move(handler); }
   void OnProgressUpdate(ProgressUpdateHandler handler) { progressUpdate_ = std::move(handler); }
   // A handler that passes reports on: `followed` tells, at each report, whether anyone is
   // following them further, so that nobody's reports are not even built.
@@ -66,7 +73,10 @@ class Worker {
   // What each class adds.
   virtual void RunBody() = 0;
   virtual std::string ResultText() = 0;  // the result of a synchronous Start
-  virtual std::string ResultsXml() = 0;  // the second argument of StatusUpdate
+  virtual xml::DocumentPtr
+  ResultsDocument() = 0;  // its text is the second argument of StatusUpdate
+  // Whether the results document is made by the run itself rather than lent by the caller.
+  virtual bool OwnsResults() const { return false; }
   virtual void AddStatusCounters(xml::Node e) = 0;
   virtual void ReleaseDocuments() = 0;
   virtual bool YieldsInStart() const { return true; }
@@ -82,12 +92,14 @@ class Worker {
   bool SettleStatus();
   void EndRun(const OnError& on);  // last report, then the run's documents are released
 
-  // Raised only when asynchronous.
-  void RaiseStatusUpdate();
+  // Raised only when asynchronous. `last`: the run's last report, after which the run lets go of
+  // its documents.
+  void RaiseStatusUpdate(bool last = false);
   void RaiseProgressUpdate(const std::function<void(xml::Node e)>& fill);
   xml::Node NewProgressElement();
-  // The same with texts made elsewhere (a relay of another worker's reports).
-  void RaiseStatusUpdate(const std::string& update, const std::string& results);
+  // The same with a report made elsewhere (a relay of another worker's reports).
+  void RaiseStatusUpdate(const std::string& update, const xml::DocumentPtr& results,
+                         bool handedOver = false);
   void RaiseProgressUpdate(const std::string& update);
   // The e_mode of the progress elements this worker makes from now on.
   void ProgressMode(int32_t mode) { mode_ = mode; }
@@ -116,6 +128,7 @@ class Worker {
   std::unique_ptr<Timer> brxTicker_;
   std::unique_ptr<xml::Document> progress_;
   StatusUpdateHandler statusUpdate_;
+  StatusDocumentHandler statusDocument_;
   ProgressUpdateHandler progressUpdate_;
   std::function<bool()> progressFollowed_;
 };

@@ -371,7 +371,7 @@ std::string Compare::CandidatePath(const LocalFileRecord& record) {
 
 std::string Compare::ResultText() { return Use(objResultsDOM).DocumentElement().Xml(); }
 
-std::string Compare::ResultsXml() { return objResultsDOM ? objResultsDOM->Xml() : ""; }
+xml::DocumentPtr Compare::ResultsDocument() { return objResultsDOM; }
 
 void Compare::AddStatusCounters(xml::Node e) {
   e.SetAttribute(vocab::e_a_total, std::to_string(e_a_total));

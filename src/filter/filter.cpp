@@ -95,7 +95,7 @@ bool Filter::FilterApplication(xml::Node a) {
 
 std::string Filter::ResultText() { return Use(objMatchesDOM).DocumentElement().Xml(); }
 
-std::string Filter::ResultsXml() { return objMatchesDOM ? objMatchesDOM->Xml() : ""; }
+xml::DocumentPtr Filter::ResultsDocument() { return objMatchesDOM; }
 
 void Filter::AddStatusCounters(xml::Node e) {
   e.SetAttribute(vocab::e_match_total, std::to_string(e_match_total));

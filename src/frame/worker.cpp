@@ -110,7 +110,7 @@ bool Worker::SettleStatus() {
 void Worker::EndRun(const OnError& on) {
   if (!asynchronous_) return;
   uint64_t generation = generation_;
-  on([&] { RaiseStatusUpdate(); });
+  on([&] { RaiseStatusUpdate(true); });
   on([&] { Yield(); });
   // A client that started this worker again from the last event owns the documents now.
   if (generation == generation_) on([&] { ReleaseDocuments(); });
@@ -123,15 +123,17 @@ xml::Node Worker::NewProgressElement() {
   return e;
 }
 
-void Worker::RaiseStatusUpdate() {
+void Worker::RaiseStatusUpdate(bool last) {
   if (!asynchronous_) return;
   AddStatusCounters(NewProgressElement());
-  std::string update = progress_->Xml();
-  RaiseStatusUpdate(update, ResultsXml());
+  RaiseStatusUpdate(progress_->Xml(), ResultsDocument(), last && OwnsResults());
 }
 
-void Worker::RaiseStatusUpdate(const std::string& update, const std::string& results) {
-  if (asynchronous_ && statusUpdate_) statusUpdate_(update, results);
+void Worker::RaiseStatusUpdate(const std::string& update, const xml::DocumentPtr& results,
+                               bool handedOver) {
+  if (!asynchronous_) return;
+  if (statusUpdate_) statusUpdate_(update, results ? results->Xml() : std::string());
+  if (statusDocument_) statusDocument_(update, results, handedOver);
 }
 
 void Worker::RaiseProgressUpdate(const std::string& update) {

@@ -119,7 +119,7 @@ void Locate::Prepare(xml::DocumentPtr& searchOptions, xml::DocumentPtr& applicat
   Log("Assigned options", kStartLabel);
 
   ProgressMode(stageMode_);
-  reported_ = searchResults_.get();
+  reported_ = &searchResults_;
 }
 
 void Locate::TickerArmed() { Log("Timer started...", kStartLabel); }
@@ -132,7 +132,7 @@ std::string Locate::ResultText() {
   return text;
 }
 
-std::string Locate::ResultsXml() { return reported_ ? reported_->Xml() : std::string(); }
+xml::DocumentPtr Locate::ResultsDocument() { return reported_ ? *reported_ : nullptr; }
 
 void Locate::ReleaseDocuments() {
   searchResults_.reset();
@@ -210,7 +210,7 @@ void Locate::Finalise() {
   on([&] { mergeResults_->DocumentElement().AppendChild(events_->DocumentElement()); });
   if (Asynchronous()) {
     ProgressMode(stageMode_);
-    reported_ = mergeResults_.get();
+    reported_ = &mergeResults_;
     on([&] { RaiseStatusUpdate(); });
   }
   Log("Locate process complete", "Finalise");

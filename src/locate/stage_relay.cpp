@@ -15,9 +15,9 @@ using locate::kClass;
 
 void Locate::SubscribeTo(Stage& stage) {
   if (!stage.worker) return;
-  stage.worker->OnStatusUpdate(
-      [this, &stage](const std::string& update, const std::string& results) {
-        StatusUpdate(stage, update, results);
+  stage.worker->OnStatusDocument(
+      [this, &stage](const std::string& update, const xml::DocumentPtr& results, bool handedOver) {
+        StatusUpdate(stage, update, results, handedOver);
       });
   stage.worker->OnProgressUpdate(
       [this, &stage](const std::string& update) { ProgressUpdate(stage, update); },
@@ -25,12 +25,17 @@ void Locate::SubscribeTo(Stage& stage) {
 }
 
 void Locate::StatusUpdate(Stage& stage, const std::string& strUpdateXML,
-                          const std::string& strResultsXML) {
+                          const xml::DocumentPtr& stageResults, bool handedOver) {
   OnError on{kClass, stage.names.statusLabel};
-  xml::Document& results = *stage.results->get();
   on([&] { progressDocument_->LoadXml(strUpdateXML); });
-  bool loaded = false;
-  on([&] { loaded = results.LoadXml(strResultsXML); });
+  // The stage's results are read from their text, which is this layer's own serialisation: a
+  // document the stage lets go of gives the same tree kept as it is, without the text between.
+  if (handedOver && stageResults) {
+    *stage.results = stageResults;
+  } else {
+    std::string strResultsXML = stageResults ? stageResults->Xml() : std::string();
+    on([&] { Use(stage.results->get()).LoadXml(strResultsXML); });
+  }
 
   // A report that cannot be read at all reads as status 0; one whose e_status is missing or not a
   // number leaves the status as it was.
@@ -45,9 +50,8 @@ void Locate::StatusUpdate(Stage& stage, const std::string& strUpdateXML,
     status_ = ToInt16(*statusText);
   });
 
-  // A stage's text is this layer's own serialisation, which a load and a new serialisation give
-  // back unchanged; only a text that did not load reads differently (as nothing).
-  on([&] { RaiseStatusUpdate(progressDocument_->Xml(), loaded ? strResultsXML : results.Xml()); });
+  // A text that did not load is relayed as what it reads as: nothing.
+  on([&] { RaiseStatusUpdate(progressDocument_->Xml(), *stage.results); });
   if (status_ == kStatusComplete) End(stage);
 }
 

@@ -170,7 +170,7 @@ void Merge::RaiseApplicationProgress(const std::string& name) {
 
 std::string Merge::ResultText() { return Use(objOldResultsDOM).DocumentElement().Xml(); }
 
-std::string Merge::ResultsXml() { return objOldResultsDOM ? objOldResultsDOM->Xml() : ""; }
+xml::DocumentPtr Merge::ResultsDocument() { return objOldResultsDOM; }
 
 void Merge::AddStatusCounters(xml::Node e) {
   e.SetAttribute(vocab::e_match_total_new, std::to_string(e_match_total_new));

@@ -225,7 +225,7 @@ std::string Search::ResultText() {
   return "";
 }
 
-std::string Search::ResultsXml() { return results_ ? results_->Xml() : ""; }
+xml::DocumentPtr Search::ResultsDocument() { return results_; }
 
 void Search::AddStatusCounters(xml::Node e) {
   e.SetAttribute(vocab::e_d_count, std::to_string(lngFolderCount));

@@ -26,12 +26,13 @@ class TestWorker : public Worker {
 
   std::string Start() {
     return StartFrame([this] {
-      results_ = std::make_unique<xml::Document>();
+      results_ = std::make_shared<xml::Document>();
       results_->LoadXml("<results/>");
     });
   }
 
   int runs = 0;
+  bool ownsResults = false;
 
  protected:
   void RunBody() override {
@@ -45,11 +46,12 @@ class TestWorker : public Worker {
     EndRun(on);
   }
   std::string ResultText() override { return results_->DocumentElement().Xml(); }
-  std::string ResultsXml() override { return results_ ? results_->Xml() : ""; }
+  xml::DocumentPtr ResultsDocument() override { return results_; }
+  bool OwnsResults() const override { return ownsResults; }
   void AddStatusCounters(xml::Node e) override { e.SetAttribute("e_runs", std::to_string(runs)); }
   void ReleaseDocuments() override { results_.reset(); }
 
-  std::unique_ptr<xml::Document> results_;
+  xml::DocumentPtr results_;
 };
 
 // The value of attribute `name` in an update's text.
@@ -97,6 +99,26 @@ TEST_F(WorkerTest, AsynchronousRunReportsInOrderAndRefusesAnotherStart) {
   EXPECT_EQ(events, (Events{"S1", "S2", "P0", "P1", "P2", "S3"}));
   EXPECT_EQ(lastResults, "<results/>");
   EXPECT_EQ(lastUpdate, R"(<e e_mode="7" e_status="3" e_runs="1"/>)");
+}
+
+// Only the last report of a run that made its own results offers them to be kept; a document the
+// run was lent may be the caller's, and one taken earlier would still be written to.
+TEST_F(WorkerTest, OnlyTheLastReportHandsOverResultsTheRunMade) {
+  for (bool owns : {false, true}) {
+    worker.ownsResults = owns;
+    std::vector<bool> handedOver;
+    xml::DocumentPtr kept;
+    worker.OnStatusDocument([&](const std::string&, const xml::DocumentPtr& results, bool given) {
+      handedOver.push_back(given);
+      kept = results;
+    });
+    worker.Start();
+    ASSERT_TRUE(RunUntilSettled());
+    EXPECT_EQ(handedOver, (std::vector<bool>{false, false, owns}));
+    ASSERT_NE(kept, nullptr);
+    EXPECT_EQ(kept.use_count(), 1);  // the worker let go of it
+    EXPECT_EQ(kept->Xml(), lastResults);
+  }
 }
 
 TEST_F(WorkerTest, CancelDuringAYieldStopsTheRunAndTheWorkerMayStartAgain) {

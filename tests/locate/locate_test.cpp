@@ -168,32 +168,36 @@ TEST_F(LocateTest, StagesRelayInOrderGatherTheirEventsAndMergeAsASynchronousRunD
   EXPECT_THAT(ValuesOf(*userData, "//a_missing/a", "a_id"), ElementsAre("2"));
 }
 
-// A Search that raises one report of its own before its run, and may answer results that are not
-// XML: what a faulty stage would send.
+// A Search that raises one report of its own before its run, and may answer results without
+// content: what a faulty stage would send.
 struct FaultySearch : Search {
-  FaultySearch(std::string faultyUpdate, std::string faultyResults)
-      : Search(fs::CreatePosixFileSystem({})), update(faultyUpdate), results(faultyResults) {}
+  FaultySearch(std::string faultyUpdate, bool noResults)
+      : Search(fs::CreatePosixFileSystem({})), update(faultyUpdate), empty(noResults) {}
   void RunBody() override {
-    if (!update.empty()) RaiseStatusUpdate(update, Search::ResultsXml());
+    if (!update.empty()) RaiseStatusUpdate(update, Search::ResultsDocument());
     Search::RunBody();
   }
-  std::string ResultsXml() override { return results.empty() ? Search::ResultsXml() : results; }
-  std::string update, results;
+  xml::DocumentPtr ResultsDocument() override {
+    return empty ? std::make_shared<xml::Document>() : Search::ResultsDocument();
+  }
+  std::string update;
+  bool empty;
 };
 
 TEST_F(LocateTest, AFaultyStageReportIsRelayedAndTheRunGoesOn) {
-  // The faulty report and results, Locate's status as the client sees the third report (the
-  // faulty one, when there is one), and the list and number of each event the fault gave.
+  // The faulty report and whether the results are empty, Locate's status as the client sees the
+  // third report (the faulty one, when there is one), and the list and number of each event the
+  // fault gave.
   for (auto [update, results, status, gathered] :
-       std::initializer_list<std::tuple<const char*, const char*, int, const char*>>{
-           {R"(<e e_mode="1" e_status="x"/>)", "", 1, "search:13"},
-           {R"(<e e_mode="1"/>)", "", 1, "search:94"},
-           {"not XML", "", 0, "search:91"},
+       std::initializer_list<std::tuple<const char*, bool, int, const char*>>{
+           {R"(<e e_mode="1" e_status="x"/>)", false, 1, "search:13"},
+           {R"(<e e_mode="1"/>)", false, 1, "search:94"},
+           {"not XML", false, 0, "search:91"},
            // The unloadable list and the selection in it, then the compare of a search that is
            // empty.
-           {"", "not XML", 2,
+           {"", true, 2,
             "compare:-2147220991 compare:91 compare:91 filter:-2147220991 filter:91 filter:91"}}) {
-    SCOPED_TRACE(std::string(update) + results);
+    SCOPED_TRACE(std::string(update) + (results ? " without results" : ""));
     Locate locate(std::make_unique<FaultySearch>(update, results),
                   std::make_unique<Compare>(fs::CreatePosixFileSystem({})),
                   std::make_unique<Filter>(), std::make_unique<Merge>());
