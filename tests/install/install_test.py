@@ -96,6 +96,11 @@ def Completion(build, program):
         if subs:
             assert subs <= Complete(script, *command, ""), command
         for entry in help.sections.get("Options", []):
+            names = entry.split()
+            # After a flag (no type follows its names) come more options, not a value.
+            if len(names) > 1 and not re.match(r"(TEXT|INT|UINT|FLOAT)\b", names[1]):
+                flag = names[0].split(",")[-1]
+                assert Complete(script, *command, flag, "-") == help.Options(), (command, flag)
             choices = re.search(r"\{(.*?)\}", entry)
             if choices:
                 option = entry.split()[0].split(",")[-1]
