@@ -1,19 +1,29 @@
 #!/usr/bin/env bash
 # Installs the Debian packages trlLocator needs (only those missing), then configures and builds.
-# Usage: ./setup.sh [example] [fuzz] [build-dir]     (default build dir: build)
+# Usage: ./setup.sh [example] [tests] [bench] [fuzz] [package] [build-dir]   (default: build)
 #   example  also installs the Node.js packages Debian ships on their own that the bundled example
 #            looks for (semver, graceful-fs, which, nopt), so that the example finds real software
+#   tests    also installs what the tests need, and builds them (BUILD_TESTING=ON)
+#   bench    also installs Google Benchmark, and builds the benchmarks (TRL_BUILD_BENCH=ON)
 #   fuzz     also installs clang and its libFuzzer runtime, and builds nothing: bench/fuzz.sh
 #            builds the fuzz targets in a folder of their own
+#   package  also installs what making a Debian package needs, and builds nothing: .ci/package
+#            builds the package in a folder of its own
 set -euo pipefail
 
 here="$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)"
 example=0
+tests=0
+bench=0
 fuzz=0
+package=0
 while [ $# -gt 0 ]; do
   case "$1" in
     example) example=1 ;;
+    tests) tests=1 ;;
+    bench) bench=1 ;;
     fuzz) fuzz=1 ;;
+    package) package=1 ;;
     *) break ;;
   esac
   shift
@@ -24,16 +34,25 @@ packages=(
   g++ cmake ninja-build pkg-config
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev nlohmann-json3-dev
   libsqlite3-dev
-  libgtest-dev libgmock-dev libbenchmark-dev
 )
-# The CycloneDX schema the tests validate against comes from npm.
-packages+=(python3-jsonschema)
-command -v npm >/dev/null || packages+=(npm)
+if ((tests)); then
+  packages+=(libgtest-dev libgmock-dev)
+  # The CycloneDX schema the tests validate against comes from npm.
+  packages+=(python3-jsonschema)
+  command -v npm >/dev/null || packages+=(npm)
+fi
+if ((bench)); then
+  packages+=(libbenchmark-dev)
+fi
 if ((example)); then
   packages+=(node-semver node-graceful-fs node-which node-nopt)
 fi
 if ((fuzz)); then
   packages+=(clang libclang-rt-14-dev)
+fi
+if ((package)); then
+  # dpkg-shlibdeps works out the package's dependencies, and needs file to find the binaries.
+  packages+=(dpkg-dev file)
 fi
 
 missing=()
@@ -55,17 +74,33 @@ if ((${#missing[@]})); then
   "${sudo[@]}" apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
 fi
 
-if ((fuzz)); then
+if ((fuzz || package)); then
   exit 0
 fi
-if [ ! -f "$build_dir/build.ninja" ]; then
-  cmake -S "$here" -B "$build_dir" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
+# A build folder configured before keeps its settings; the words turn on what they ask for.
+options=()
+if ((tests)); then options+=(-DBUILD_TESTING=ON); fi
+if ((bench)); then options+=(-DTRL_BUILD_BENCH=ON); fi
+cache="$build_dir/CMakeCache.txt"
+configured() {
+  local option
+  [ -f "$build_dir/build.ninja" ] || return 1
+  for option in "${options[@]}"; do
+    grep -qx -- "${option#-D}" <(sed 's/:[A-Z]*=/=/' "$cache") || return 1
+  done
+}
+if ! configured; then
+  cmake -S "$here" -B "$build_dir" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo "${options[@]}" \
+    >/dev/null
 fi
 if ! log=$(cmake --build "$build_dir" -- --quiet 2>&1); then
   printf '%s\n' "$log" >&2
   exit 1
 fi
 
+if ((!tests)); then
+  exit 0
+fi
 # The published CycloneDX 1.6 JSON schema, for the test that validates the bill of materials.
 schema_dir="$build_dir/cyclonedx-schema"
 if [ ! -f "$schema_dir/bom-1.6.SNAPSHOT.schema.json" ]; then

@@ -20,7 +20,7 @@ work_dir=$(realpath -m "${2:-/tmp/trl-compare-bench}")
 runs=${RUNS:-5}
 for tool in make_compare_data compare_bench; do
   [[ -x $build_dir/bench/$tool ]] || {
-    echo "missing $build_dir/bench/$tool: cmake --build $build_dir --target $tool" >&2
+    echo "missing $build_dir/bench/$tool: ./setup.sh bench (or configure with -DTRL_BUILD_BENCH=ON)" >&2
     exit 1
   }
 done

@@ -31,7 +31,7 @@ if [[ ! -f $build_dir/build.ninja ]]; then
   launcher=()
   if command -v ccache >/dev/null; then launcher=(-DCMAKE_CXX_COMPILER_LAUNCHER=ccache); fi
   cmake -S "$here" -B "$build_dir" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo \
-    -DCMAKE_CXX_COMPILER=clang++ -DTRL_FUZZ=ON -DTRL_BUILD_TESTS=OFF -DTRL_BUILD_BENCH=OFF \
+    -DCMAKE_CXX_COMPILER=clang++ -DTRL_FUZZ=ON \
     "${launcher[@]}" >/dev/null
 fi
 if ! log=$(nice cmake --build "$build_dir" --target trl_fuzzers -- --quiet 2>&1); then

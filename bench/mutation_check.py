@@ -205,7 +205,7 @@ class Scratch:
                     "-DCMAKE_BUILD_TYPE=Release", "-DCMAKE_CXX_FLAGS_RELEASE=-O1 -g0 -DNDEBUG",
                     f"-DCMAKE_EXE_LINKER_FLAGS={linker}", "-DCMAKE_CXX_COMPILER_LAUNCHER=ccache",
                     "-DCMAKE_GTEST_DISCOVER_TESTS_DISCOVERY_MODE=PRE_TEST",
-                    "-DTRL_BUILD_BENCH=OFF"])
+                    "-DBUILD_TESTING=ON"])
         self.Check(["ninja", "-C", self.build, "-j", self.jobs])
         self.Check(["ctest", "--test-dir", self.build, "-j", self.jobs, "--timeout", "30"], False)
         failedLog = self.build / "Testing/Temporary/LastTestsFailed.log"

@@ -10,7 +10,7 @@ scale_inputs() {
   tree=/tmp/trl-search-bench/tree-1000000
   data=/tmp/trl-compare-bench/apps-$apps
   for tool in "$trllocator" "$build_dir/bench/make_tree" "$build_dir/bench/make_compare_data"; do
-    [[ -x $tool ]] || { echo "missing $tool: build it first" >&2; exit 1; }
+    [[ -x $tool ]] || { echo "missing $tool: ./setup.sh bench (or configure with -DTRL_BUILD_BENCH=ON)" >&2; exit 1; }
   done
   mkdir -p "$(dirname "$tree")" "$(dirname "$data")"
   if [[ ! -f $tree.done ]]; then

@@ -17,7 +17,7 @@ runs=3
 
 make_tree="$build_dir/bench/make_tree"
 trllocator="$build_dir/trllocator"
-[[ -x $make_tree ]] || { echo "missing $make_tree: cmake --build $build_dir --target make_tree" >&2; exit 1; }
+[[ -x $make_tree ]] || { echo "missing $make_tree: ./setup.sh bench (or configure with -DTRL_BUILD_BENCH=ON)" >&2; exit 1; }
 command -v bfs >/dev/null || { echo "bfs is not installed (apt-get install bfs)" >&2; exit 1; }
 [[ -x /usr/bin/time ]] || { echo "/usr/bin/time is not installed (apt-get install time)" >&2; exit 1; }
 mkdir -p "$work_dir"

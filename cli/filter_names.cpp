@@ -51,6 +51,12 @@ std::string_view FilterName(int16_t bit) {
   return known != kFilterNames.end() ? known->first : "";
 }
 
+std::vector<std::string_view> FilterNames() {
+  std::vector<std::string_view> names;
+  for (const auto& entry : kFilterNames) names.push_back(entry.first);
+  return names;
+}
+
 int16_t ParseFilterOptions(std::string_view text) {
   if (!text.empty() &&
       std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; })) {

@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdint>
 #include <string_view>
+#include <vector>
 
 #include "trl/filter.h"
 
@@ -23,5 +24,7 @@ inline constexpr std::array<int16_t, 6> kFilterOrder{LowWeights,       MissingFi
                                                      DuplicateMatches, FlagUnknowns, FlagUnmanaged};
 // The name of one rule's bit, as ParseFilterOptions takes it.
 std::string_view FilterName(int16_t bit);
+// Every name ParseFilterOptions takes, in the order above, "all" last.
+std::vector<std::string_view> FilterNames();
 
 }  // namespace trl::cli

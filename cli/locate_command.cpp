@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "atomic_file.h"
+#include "bundled_example.h"
 #include "command_error.h"
 #include "detached_end.h"
 #include "document_files.h"
@@ -33,8 +34,6 @@
 
 namespace trl::cli {
 namespace {
-
-constexpr const char* kExamplesDir = TRL_EXAMPLES_DIR;
 
 struct LocateOptions {
   std::vector<std::string> paths, excluded;
@@ -78,7 +77,7 @@ Documents LoadDocuments(const LocateOptions& options) {
 
 Documents LoadNamedDocuments(const LocateOptions& options, const std::string& userData) {
   auto example = [](const char* name, const DocumentRole& role) {
-    std::string path = (std::filesystem::path(kExamplesDir) / name).string();
+    std::string path = (BundledExampleFolder() / name).string();
     if (!std::filesystem::exists(path)) {
       throw CommandError(fmt::format(
           "the bundled example is not at '{}': name the documents with --search-options, "

@@ -8,6 +8,7 @@
 #include <unordered_set>
 #include <vector>
 
+#include "trl/export.h"
 #include "trl/worker.h"
 #include "trl/xml.h"
 
@@ -31,7 +32,7 @@ class FileSystem;
 // search recorded. Every application version of which a file was found is filed, with its scores,
 // under the computer, drive and application folder where it was found; versions that lack a file
 // that carries weight are taken back out.
-class Compare : public Worker {
+class TRL_API Compare : public Worker {
  public:
   // Works on this machine's file system, with network paths through the system's network mounts.
   Compare();
@@ -77,7 +78,7 @@ class Compare : public Worker {
   // One results copy of an application, with the ids of its computer, drive and folder: Compare
   // only appends, and each level is numbered from a growing counter, so these ids order the copies
   // as the document does.
-  struct ApplicationCopy {
+  struct TRL_LOCAL ApplicationCopy {
     int32_t computer, drive, folder;
     xml::Node element;
   };
@@ -87,7 +88,7 @@ class Compare : public Worker {
   void Match();
   void Finish();
   bool MatchApplication(xml::Node a);
-  struct VersionMatch;
+  struct TRL_LOCAL VersionMatch;
   bool MatchVersion(xml::Node v);
   // Files the find of a local file for the version's file under its application folder.
   void RecordFind(VersionMatch& match, const LocalFileRecord& record,
@@ -163,7 +164,7 @@ class Compare : public Worker {
   bool explaining_ = false;
   // A property of the file MatchFile tested last that did not agree: its kind, the value expected
   // and the file's own, each as it was compared (absent when it could not be read).
-  struct Disagreement {
+  struct TRL_LOCAL Disagreement {
     int16_t kind;
     std::optional<std::string> expected, local;
   };
@@ -172,7 +173,7 @@ class Compare : public Worker {
   std::unordered_set<const void*> draftedVersions_;  // of the application being matched
   // A place the application being matched was found in: the listed drive and the fingerprint
   // application, with the computer, drive, folder and copy the results hold for them.
-  struct FoundPlace {
+  struct TRL_LOCAL FoundPlace {
     uint32_t drive;
     const void* application;
     xml::Node c, m, d, a;
@@ -193,7 +194,7 @@ class Compare : public Worker {
 
   unsigned readThreads_;
   bool indexBuiltEarly_ = false;  // rsLocalFiles was filled in Start, without a report
-  struct ReadPlan;
+  struct TRL_LOCAL ReadPlan;
   std::unique_ptr<ReadPlan> readPlan_;
   // Reads files of filesSeen_, so it goes first.
   std::unique_ptr<ReadAhead> readAhead_;

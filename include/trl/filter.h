@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <string>
 
+#include "trl/export.h"
 #include "trl/worker.h"
 #include "trl/xml.h"
 
@@ -22,7 +23,7 @@ enum trlFilterOptions : int16_t {
 // The third stage of a locate run: scores every version a compare matched, reduces each found
 // application to the versions the filter options let stand, and writes on each application the
 // identity of its one remaining version, or a marker that none or several are left.
-class Filter : public Worker {
+class TRL_API Filter : public Worker {
  public:
   Filter();
   ~Filter() override;

@@ -6,6 +6,7 @@
 #include <string>
 #include <string_view>
 
+#include "trl/export.h"
 #include "trl/worker.h"
 #include "trl/xml.h"
 
@@ -23,7 +24,7 @@ class FileSystem;
 // The class a client normally uses: one Start runs Search, Compare, Filter and Merge in order,
 // hands each stage's results to the next, relays the stages' reports, gathers the events they
 // recorded and delivers the merged user data; with LogFile set it writes a run log.
-class Locate : public Worker {
+class TRL_API Locate : public Worker {
  public:
   // Which stage a run is in.
   enum StageMode : int16_t {
@@ -72,7 +73,7 @@ class Locate : public Worker {
   void TickerArmed() override;
 
  private:
-  struct Stage;
+  struct TRL_LOCAL Stage;
   void SubscribeTo(Stage& stage);
   // Relays the stage's progress reports while this worker's client follows them (a stage that
   // nobody follows does not build its reports).

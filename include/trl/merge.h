@@ -4,6 +4,7 @@
 #include <memory>
 #include <string>
 
+#include "trl/export.h"
 #include "trl/worker.h"
 #include "trl/xml.h"
 
@@ -18,7 +19,7 @@ class PlaceIndex;
 // from earlier runs. Each application found again keeps the client's management setting and
 // flags and a history of its version changes; a managed application no longer found where it was
 // is moved into the user data's list of missing applications.
-class Merge : public Worker {
+class TRL_API Merge : public Worker {
  public:
   Merge();
   ~Merge() override;
@@ -39,7 +40,7 @@ class Merge : public Worker {
 
  private:
   // The document-wide flag defaults of the old results.
-  struct Defaults {
+  struct TRL_LOCAL Defaults {
     std::string update;
     std::string dupes;
   };

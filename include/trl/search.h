@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "trl/export.h"
 #include "trl/worker.h"
 #include "trl/xml.h"
 
@@ -25,7 +26,7 @@ class Folder;
 // The first stage of a locate run: walks the computers, drives and folders the search options
 // name, looks in those folders for the files of the applications they list, and records what it
 // finds in the local-files document (computers, drives, folders, files and file properties).
-class Search : public Worker {
+class TRL_API Search : public Worker {
  public:
   // Works on this machine's file system, with network paths through the system's network mounts.
   Search();
@@ -61,7 +62,7 @@ class Search : public Worker {
  private:
   // What the run last read from the search options and the fingerprint. A value that cannot be
   // read keeps what the previous element gave, so these live for the whole run.
-  struct Reading {
+  struct TRL_LOCAL Reading {
     std::string cText, cName, mText, mName, folder, aId, aName, fName, fRelpath, fFullpath;
     bool local = false;
     bool recurse = false;
@@ -99,7 +100,7 @@ class Search : public Worker {
 
   // Links to folders, noted while the folders of one drive are walked and written under its
   // element when they are done, for those that lead into a walked folder.
-  struct LinkNotes {
+  struct TRL_LOCAL LinkNotes {
     struct Root {
       std::string real, relative;
       bool recurse;

@@ -6,6 +6,7 @@
 #include <string>
 #include <string_view>
 
+#include "trl/export.h"
 #include "trl/xml.h"
 
 namespace trl {
@@ -25,7 +26,7 @@ inline constexpr int16_t kStatusCancelled = 255;
 // ProgressUpdate; Status tells where the run stands and Cancel stops a running one. No failure ever
 // leaves a public member: failures are reported to the thread's reporter and the work goes on.
 // A client must not destroy a worker from inside one of that worker's events.
-class Worker {
+class TRL_API Worker {
  public:
   using StatusUpdateHandler =
       std::function<void(const std::string& strUpdateXML, const std::string& strResultsXML)>;

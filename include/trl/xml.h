@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "trl/export.h"
+
 namespace trl::xml {
 
 class Document;
@@ -20,7 +22,7 @@ enum class NodeType { kNull, kDocument, kElement, kText, kCData, kComment, kProc
 // A handle to one node of a Document, or to no node ("no object"). Copying a handle does not copy
 // the node. A handle is valid while its document lives and the node stays in it; every operation
 // on a handle to no node fails with kObjectNotSet (91) instead of doing nothing.
-class Node {
+class TRL_API Node {
  public:
   Node() = default;
 
@@ -118,7 +120,7 @@ struct Limits {
 
 // An XML document: the tree the component reads and writes, with XPath 1.0 selections, raw
 // serialisation and attribute order kept as written.
-class Document {
+class TRL_API Document {
  public:
   Document();
   ~Document();
@@ -161,7 +163,7 @@ class Document {
   // Unique per document object in this process, never reused.
   uint64_t Serial() const;
 
-  struct Impl;
+  struct TRL_LOCAL Impl;
 
  private:
   friend class Node;
