@@ -87,11 +87,17 @@ class RegistryLock {
   int fd_;
 };
 
-std::vector<std::string> ReadLines(const fs::path& file) {
-  std::vector<std::string> lines;
+// The lines of the file (none when there is no file); false when a file is there but cannot be
+// read, so that its lines are never lost by writing it anew.
+bool ReadLines(const fs::path& file, std::vector<std::string>& lines) {
   std::ifstream in(file);
+  if (!in) {
+    std::error_code failed;
+    bool there = fs::exists(file, failed);
+    return !there && !failed;
+  }
   for (std::string line; std::getline(in, line);) lines.push_back(line);
-  return lines;
+  return !in.bad();
 }
 
 // Replaces the file by one holding `lines`, or removes it when there are none.
@@ -134,7 +140,8 @@ TrlResult ChangeRegistry(const std::string& libraryPath,
   RegistryLock lock(*folder);
   if (!lock.Held()) return TRL_SELFREG_E_CLASS;
   fs::path file = *folder / kFileName;
-  std::vector<std::string> lines = ReadLines(file);
+  std::vector<std::string> lines;
+  if (!ReadLines(file, lines)) return TRL_SELFREG_E_CLASS;
   std::vector<std::string> before = lines;
   change(lines, OurLines(libraryPath));
   if (lines == before) return TRL_S_OK;

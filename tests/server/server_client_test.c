@@ -2,6 +2,7 @@
  * given on its command line, then finds, loads and uses it only through the registry file. */
 #define _XOPEN_SOURCE 700
 #include <dlfcn.h>
+#include <pthread.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
@@ -521,6 +522,14 @@ static void CheckRefusals(TrlDispatch* locate, TrlDispatch* filter, TrlDocument*
   CHECK(ids[2] == TRL_DISPID_UNKNOWN);
 }
 
+/* Another thread may not call an object: the run and its timer live on the creating thread. */
+static void* CallFromAnotherThread(void* object) {
+  TrlDispatch* locate = object;
+  TrlValue result = {TRL_VT_EMPTY, {0}, {0}};
+  CHECK_RESULT(Invoke(locate, 0x68030000, GET, &result, NULL, 0, NULL), TRL_E_WRONG_THREAD);
+  return NULL;
+}
+
 static int ATagHas(TrlDocument* document, const char* attribute) {
   char* text = NULL;
   lib.DocumentXml(document, &text);
@@ -589,6 +598,9 @@ int main(int argc, char** argv) {
       "<f f_id=\"1\" f_name=\"app.bin\" f_relpath=\"\" f_weight=\"1\">"
       "<p p_type=\"2\" p_weight=\"1\" p_value=\"5\"/></f></v></a></trl_fingerprint>");
   CheckRefusals(objects[LOCATE], objects[FILTER], fingerprint);
+  pthread_t other;
+  pthread_create(&other, NULL, CallFromAnotherThread, objects[LOCATE]);
+  pthread_join(other, NULL);
 
   /* Synchronous: each stage by hand, on the caller's documents, then Locate; no events. */
   Sink quiet;
