@@ -39,66 +39,46 @@ static const TrlGuid kContainer = TRL_IID_CONNECTIONPOINTCONTAINER;
 enum { GET = TRL_DISPATCH_PROPERTYGET, PUT = TRL_DISPATCH_PROPERTYPUT, CALL = TRL_DISPATCH_METHOD };
 
 /* The classes as their type library gives them. */
+typedef struct ExpectedMember {
+  const char* name;
+  TrlDispId id;
+  uint16_t flags;
+} ExpectedMember;
+static const ExpectedMember kStageMembers[] = {
+    {"Asynchronous", 0x68030001, GET}, {"Asynchronous", 0x68030001, PUT},
+    {"Status", 0x68030000, GET},       {"Start", 0x60030002, CALL},
+    {"Cancel", 0x60030003, CALL},      {NULL, 0, 0}};
+static const ExpectedMember kSearchMembers[] = {
+    {"Asynchronous", 0x68030001, GET}, {"Asynchronous", 0x68030001, PUT},
+    {"Status", 0x68030000, GET},       {"Cancel", 0x60030002, CALL},
+    {"Start", 0x60030003, CALL},       {NULL, 0, 0}};
+static const ExpectedMember kLocateMembers[] = {{"Asynchronous", 0x68030003, PUT},
+                                                {"Asynchronous", 0x68030003, GET},
+                                                {"LogFile", 0x68030002, PUT},
+                                                {"LogFile", 0x68030002, GET},
+                                                {"Mode", 0x68030001, GET},
+                                                {"Status", 0x68030000, GET},
+                                                {"Start", 0x60030004, CALL},
+                                                {"Cancel", 0x60030005, CALL},
+                                                {NULL, 0, 0}};
 static const struct Expected {
-  const char* progId;
-  const char* classId;
-  const char* defaultId;
-  const char* eventId;
-  struct {
-    const char* name;
-    TrlDispId id;
-    uint16_t flags;
-  } members[8];
-} kClasses[] = {
-    {"trlLocator.Compare",
-     "{C58C197B-8F7C-40E1-8EE6-835944A1049F}",
-     "{AF4C1C7A-C434-4304-B679-F94D471FB04D}",
-     "{FEA3456A-570E-4868-9AE5-D72B5F2D0EBD}",
-     {{"Asynchronous", 0x68030001, GET},
-      {"Asynchronous", 0x68030001, PUT},
-      {"Status", 0x68030000, GET},
-      {"Start", 0x60030002, CALL},
-      {"Cancel", 0x60030003, CALL}}},
-    {"trlLocator.Filter",
-     "{4C1E74BE-E45A-48DC-A8A0-E718B7AFEE5A}",
-     "{9D54D732-4800-49E9-B718-1152E6D1130D}",
-     "{03A7D178-CAB5-4010-A784-FFCBEAE67094}",
-     {{"Asynchronous", 0x68030001, GET},
-      {"Asynchronous", 0x68030001, PUT},
-      {"Status", 0x68030000, GET},
-      {"Start", 0x60030002, CALL},
-      {"Cancel", 0x60030003, CALL}}},
-    {"trlLocator.Locate",
-     "{9271413F-2B9A-42D9-95ED-E5E3CF6C0072}",
-     "{02F12903-3DE1-4AE6-8005-46CEA1F67FBB}",
-     "{D4466B3B-5B80-401E-8A3D-0C21B609E7E9}",
-     {{"Asynchronous", 0x68030003, PUT},
-      {"Asynchronous", 0x68030003, GET},
-      {"LogFile", 0x68030002, PUT},
-      {"LogFile", 0x68030002, GET},
-      {"Mode", 0x68030001, GET},
-      {"Status", 0x68030000, GET},
-      {"Start", 0x60030004, CALL},
-      {"Cancel", 0x60030005, CALL}}},
-    {"trlLocator.Merge",
-     "{1C048253-E86E-4B5A-BBB0-5B4FD327D28B}",
-     "{5B149139-0019-4E90-AA4B-405DD91561C8}",
-     "{E07E4053-37B4-420E-A0B4-70FB6F023D5D}",
-     {{"Asynchronous", 0x68030001, GET},
-      {"Asynchronous", 0x68030001, PUT},
-      {"Status", 0x68030000, GET},
-      {"Start", 0x60030002, CALL},
-      {"Cancel", 0x60030003, CALL}}},
-    {"trlLocator.Search",
-     "{DCFC2C95-651D-46A8-A31E-6EE58125C2E3}",
-     "{C7593F0D-CF9E-450A-AF16-BD0AAE7AB1FE}",
-     "{0159F6AA-64AE-4962-8A87-879E2F090366}",
-     {{"Asynchronous", 0x68030001, GET},
-      {"Asynchronous", 0x68030001, PUT},
-      {"Status", 0x68030000, GET},
-      {"Cancel", 0x60030002, CALL},
-      {"Start", 0x60030003, CALL}}},
-};
+  const char *progId, *classId, *defaultId, *eventId;
+  const ExpectedMember* members;
+} kClasses[] = {{"trlLocator.Compare", "{C58C197B-8F7C-40E1-8EE6-835944A1049F}",
+                 "{AF4C1C7A-C434-4304-B679-F94D471FB04D}", "{FEA3456A-570E-4868-9AE5-D72B5F2D0EBD}",
+                 kStageMembers},
+                {"trlLocator.Filter", "{4C1E74BE-E45A-48DC-A8A0-E718B7AFEE5A}",
+                 "{9D54D732-4800-49E9-B718-1152E6D1130D}", "{03A7D178-CAB5-4010-A784-FFCBEAE67094}",
+                 kStageMembers},
+                {"trlLocator.Locate", "{9271413F-2B9A-42D9-95ED-E5E3CF6C0072}",
+                 "{02F12903-3DE1-4AE6-8005-46CEA1F67FBB}", "{D4466B3B-5B80-401E-8A3D-0C21B609E7E9}",
+                 kLocateMembers},
+                {"trlLocator.Merge", "{1C048253-E86E-4B5A-BBB0-5B4FD327D28B}",
+                 "{5B149139-0019-4E90-AA4B-405DD91561C8}", "{E07E4053-37B4-420E-A0B4-70FB6F023D5D}",
+                 kStageMembers},
+                {"trlLocator.Search", "{DCFC2C95-651D-46A8-A31E-6EE58125C2E3}",
+                 "{C7593F0D-CF9E-450A-AF16-BD0AAE7AB1FE}", "{0159F6AA-64AE-4962-8A87-879E2F090366}",
+                 kSearchMembers}};
 enum { COMPARE, FILTER, LOCATE, MERGE, SEARCH, CLASSES };
 
 /* The library's functions, found by name in the library the registry names. */
@@ -117,26 +97,27 @@ static struct {
   void (*StringFree)(char*);
 } lib;
 
-static void* Symbol(const char* name) {
-  void* found = dlsym(lib.handle, name);
-  if (found == NULL) fprintf(stderr, "no %s in the library\n", name), exit(1);
-  return found;
-}
-
 static void Load(const char* path) {
+  const struct {
+    void* field;
+    const char* name;
+  } symbols[] = {{&lib.GetClassObject, "DllGetClassObject"},
+                 {&lib.CanUnloadNow, "DllCanUnloadNow"},
+                 {&lib.Register, "DllRegisterServer"},
+                 {&lib.Unregister, "DllUnregisterServer"},
+                 {&lib.Pump, "TrlPump"},
+                 {&lib.ValueClear, "TrlValueClear"},
+                 {&lib.DocumentCreate, "TrlDocumentCreate"},
+                 {&lib.DocumentRelease, "TrlDocumentRelease"},
+                 {&lib.DocumentLoadXml, "TrlDocumentLoadXml"},
+                 {&lib.DocumentXml, "TrlDocumentXml"},
+                 {&lib.StringFree, "TrlStringFree"}};
   lib.handle = dlopen(path, RTLD_NOW | RTLD_LOCAL);
   if (lib.handle == NULL) fprintf(stderr, "%s\n", dlerror()), exit(1);
-  *(void**)&lib.GetClassObject = Symbol("DllGetClassObject");
-  *(void**)&lib.CanUnloadNow = Symbol("DllCanUnloadNow");
-  *(void**)&lib.Register = Symbol("DllRegisterServer");
-  *(void**)&lib.Unregister = Symbol("DllUnregisterServer");
-  *(void**)&lib.Pump = Symbol("TrlPump");
-  *(void**)&lib.ValueClear = Symbol("TrlValueClear");
-  *(void**)&lib.DocumentCreate = Symbol("TrlDocumentCreate");
-  *(void**)&lib.DocumentRelease = Symbol("TrlDocumentRelease");
-  *(void**)&lib.DocumentLoadXml = Symbol("TrlDocumentLoadXml");
-  *(void**)&lib.DocumentXml = Symbol("TrlDocumentXml");
-  *(void**)&lib.StringFree = Symbol("TrlStringFree");
+  for (size_t i = 0; i < sizeof symbols / sizeof symbols[0]; ++i) {
+    *(void**)symbols[i].field = dlsym(lib.handle, symbols[i].name);
+    if (*(void**)symbols[i].field == NULL) fprintf(stderr, "no %s\n", symbols[i].name), exit(1);
+  }
 }
 
 static char registryFile[4096];
@@ -328,12 +309,8 @@ static TrlResult SinkInvoke(TrlDispatch* self, TrlDispId id, const TrlGuid* iid,
   }
   return TRL_S_OK;
 }
-static TrlResult SinkNoTypes(TrlDispatch* self, uint32_t* count) {
-  (void)self;
-  *count = 0;
-  return TRL_S_OK;
-}
-static const TrlDispatchVtbl kSinkVtbl = {SinkQuery, SinkAddRef, SinkRelease, SinkNoTypes,
+/* The library never asks a sink for type information or names. */
+static const TrlDispatchVtbl kSinkVtbl = {SinkQuery, SinkAddRef, SinkRelease, NULL,
                                           NULL,      NULL,       SinkInvoke};
 
 /* Connects a new sink to the class's event interface, as a client finds it. */
@@ -401,7 +378,7 @@ static const char* StatusReports(const Sink* sink) {
 }
 
 static TrlDispId Id(int which, const char* name, uint16_t flags) {
-  for (int k = 0; k < 8 && kClasses[which].members[k].name; ++k) {
+  for (int k = 0; kClasses[which].members[k].name; ++k) {
     if (!strcmp(kClasses[which].members[k].name, name) &&
         kClasses[which].members[k].flags == flags) {
       return kClasses[which].members[k].id;
@@ -420,7 +397,7 @@ static void CheckMembers(int which, TrlDispatch* object) {
   CHECK(face == object);
   object->vtbl->Release(object);
   CHECK_RESULT(object->vtbl->QueryInterface(object, &other, &face), TRL_E_NOINTERFACE);
-  for (int k = 0; k < 8 && expected->members[k].name; ++k) {
+  for (int k = 0; expected->members[k].name; ++k) {
     TrlDispId id = 0;
     CHECK_RESULT(object->vtbl->GetIDsOfNames(object, &kNull, &expected->members[k].name, 1, 0, &id),
                  TRL_S_OK);
