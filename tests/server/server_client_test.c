@@ -599,10 +599,11 @@ int main(int argc, char** argv) {
     TrlValue args[] = {DocumentRef(&applicationOptions), DocumentRef(&localFiles),
                        DocumentRef(&fingerprint)};
     TrlValue result = {TRL_VT_EMPTY, {0}, {0}};
+    TrlDocument* caller = fingerprint;
     CHECK_RESULT(Invoke(objects[COMPARE], 0x60030002, CALL, &result, NULL, 3, args), TRL_S_OK);
     CHECK(result.type == TRL_VT_TEXT && lib.DocumentLoadXml(matches, result.u.text) == TRL_S_OK);
     lib.ValueClear(&result);
-    CHECK(Contains(fingerprint, "f_bitmask=\"1\""));
+    CHECK(fingerprint == caller && Contains(fingerprint, "f_bitmask=\"1\""));
   }
   {
     TrlValue args[] = {Number(TRL_VT_I2, 63), DocumentRef(&matches)};
