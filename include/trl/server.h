@@ -219,7 +219,7 @@ typedef struct TrlDispatchVtbl {
                              uint32_t count, uint32_t lcid, TrlDispId* ids);
   /* `result` may be null; otherwise it receives the member's value (TRL_VT_EMPTY for none), which
    * the caller clears. `argError`, when not null, receives the index in params->args of the
-   * argument of a TRL_DISP_E_TYPEMISMATCH, TRL_DISP_E_OVERFLOW or TRL_DISP_E_PARAMNOTFOUND. */
+   * argument at fault when one is (a type mismatch, an overflow, a name or value not allowed). */
   TrlResult (*Invoke)(TrlDispatch* self, TrlDispId member, const TrlGuid* iid, uint32_t lcid,
                       uint16_t flags, TrlParams* params, TrlValue* result, void* exceptionInfo,
                       uint32_t* argError);
