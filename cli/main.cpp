@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "check_command.h"
+#include "collect_command.h"
 #include "command_error.h"
 #include "compare_command.h"
 #include "detached_end.h"
@@ -29,11 +30,11 @@ int RunProgram(int argc, char** argv) {
       "Exit codes: 0 done; 1 the run did not complete or its output could not be written; "
       "2 a bad command line or input document; 3 done, but failures were reported (locate); "
       "130 cancelled by Ctrl-C.");
-  std::vector<std::function<int()>> commands{AddSearchCommand(app),    AddCompareCommand(app),
-                                             AddFilterCommand(app),    AddMergeCommand(app),
-                                             AddLocateCommand(app),    AddFingerprintCommand(app),
-                                             AddInventoryCommand(app), AddManageCommand(app),
-                                             AddCheckCommand(app),     AddExplainCommand(app)};
+  std::vector<std::function<int()>> commands{
+      AddSearchCommand(app),    AddCompareCommand(app), AddFilterCommand(app),
+      AddMergeCommand(app),     AddLocateCommand(app),  AddFingerprintCommand(app),
+      AddInventoryCommand(app), AddManageCommand(app),  AddCheckCommand(app),
+      AddExplainCommand(app),   AddCollectCommand(app)};
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& done) {
