@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <filesystem>
 #include <memory>
 #include <string>
 #include <vector>
@@ -11,8 +12,11 @@
 #include "command_error.h"
 #include "document_files.h"
 #include "filter_names.h"
+#include "frame/vocabulary.h"
 #include "machine_results.h"
+#include "native_path.h"
 #include "path_search_options.h"
+#include "platform/text.h"
 #include "stage_command.h"
 #include "trl/compare.h"
 #include "trl/filter.h"
@@ -34,6 +38,20 @@ std::string ThisHostName() {
     throw CommandError("this machine has no host name: give --computer NAME");
   }
   return name.data();
+}
+
+// Gives each application folder of this machine the letter case its names have on disk: the
+// compare writes them lower-cased, and where the inventory is shown, the disk cannot be asked.
+void SpellFoldersAsOnDisk(xml::Document& results) {
+  for (xml::Node d : results.AsNode().SelectNodes("/*/c[@c_local='1']/m[@m_text='']/d")) {
+    auto folder = d.GetAttribute(vocab::d_text);
+    if (!folder) continue;
+    std::string spelt = "\\";
+    for (const auto& part : std::filesystem::path(NativePath(*folder))) {
+      if (part != "/" && !part.empty()) spelt += NameFromNative(part.native()) + "\\";
+    }
+    d.SetAttribute(vocab::d_text, spelt);
+  }
 }
 
 // The document a stage gave as text, for the next stage.
@@ -76,6 +94,7 @@ int RunCollect(const CollectOptions& options) {
     throw CommandError("the filter produced no document", kExitFailed);
   }
 
+  SpellFoldersAsOnDisk(*matches);
   xml::DocumentPtr machine = MachineResults(computer, *searchOptions, *matches);
   TextPieces text = [&](const auto& put) { machine->WriteXml(put); };
   if (options.stage.output.ends_with(".gz")) {
