@@ -8,6 +8,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "command_error.h"
@@ -52,6 +53,16 @@ int RunMerge(const MergeOptions& options) {
   return WriteStageOutput(text, "merge", options.stage);
 }
 
+// Says that a machine's results are left out of the merge, and why.
+void LeaveOut(const CommandError& error, int& leftOut) {
+  std::string why = error.what();
+  // The merge goes on without them: the loader's "nothing was written" would mislead.
+  constexpr std::string_view kNothingWritten = "; nothing was written";
+  if (why.ends_with(kNothingWritten)) why.resize(why.size() - kNothingWritten.size());
+  std::fprintf(stderr, "trllocator: %s; left out\n", Printable(why).c_str());
+  ++leftOut;
+}
+
 // A machine's results file, and the machine it is of.
 struct MachineFile {
   MachineName machine;
@@ -71,8 +82,7 @@ std::vector<MachineFile> InMergeOrder(const std::vector<std::string>& paths, int
       }
       files.push_back({*machine, path});
     } catch (const CommandError& error) {
-      std::fprintf(stderr, "trllocator: %s; left out\n", Printable(error.what()).c_str());
-      ++leftOut;
+      LeaveOut(error, leftOut);
     }
   }
   std::stable_sort(files.begin(), files.end(), [](const MachineFile& x, const MachineFile& y) {
@@ -119,8 +129,7 @@ int MergeMachines(const MergeOptions& options) {
             fmt::format("the machine results '{}' changed while they were read", file.path));
       }
     } catch (const CommandError& error) {
-      std::fprintf(stderr, "trllocator: %s; left out\n", Printable(error.what()).c_str());
-      ++leftOut;
+      LeaveOut(error, leftOut);
       continue;
     }
     ListManagedApplicationsByName(*run.searchOptions, *userData);
