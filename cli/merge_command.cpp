@@ -3,8 +3,11 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <memory>
 #include <optional>
 #include <string>
@@ -30,6 +33,7 @@ struct MergeOptions {
   std::string userData;
   std::string newResults;
   std::vector<std::string> machines;
+  std::string machineList;
   bool save = false;
   StageOptions stage;
 };
@@ -99,6 +103,21 @@ std::vector<MachineFile> InMergeOrder(const std::vector<std::string>& paths, int
   return files;
 }
 
+// The machines' results files named on the command line, then those the list names, one a line.
+std::vector<std::string> MachineFiles(const MergeOptions& options) {
+  std::vector<std::string> files = options.machines;
+  if (options.machineList.empty()) return files;
+  std::ifstream list(options.machineList);
+  if (!list) {
+    throw CommandError(fmt::format("cannot read the list of machine results '{}': {}",
+                                   options.machineList, std::strerror(errno)));
+  }
+  for (std::string line; std::getline(list, line);) {
+    if (!line.empty()) files.push_back(line);
+  }
+  return files;
+}
+
 int MergeMachines(const MergeOptions& options) {
   // Held from the reading of the user data to its replacing: a merge saving meanwhile would be
   // lost.
@@ -115,7 +134,7 @@ int MergeMachines(const MergeOptions& options) {
       LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
 
   int leftOut = 0;
-  std::vector<MachineFile> files = InMergeOrder(options.machines, leftOut);
+  std::vector<MachineFile> files = InMergeOrder(MachineFiles(options), leftOut);
   ReportPrinter printer(options.stage);
   Merge merge;
   merge.BeginSequence(applicationOptions, userData);
@@ -171,7 +190,12 @@ std::function<int()> AddMergeCommand(CLI::App& app) {
       ->required();
   CLI::Option* newResults = command->add_option(
       "--new-results", options->newResults, "Results of the run just made (the filtered matches)");
-  command->get_option("machine-results")->excludes(searchOptions)->excludes(newResults);
+  CLI::Option* machineList = command->add_option(
+      "--machine-list", options->machineList,
+      "A file that names results of machines, one a line (for more than a command line holds)");
+  for (CLI::Option* machines : {command->get_option("machine-results"), machineList}) {
+    machines->excludes(searchOptions)->excludes(newResults);
+  }
   command->add_flag("--save", options->save,
                     "With results of machines: replace the --user-data file with the merged "
                     "user data (atomically, unless nothing changed; the previous one is kept as "
@@ -179,7 +203,8 @@ std::function<int()> AddMergeCommand(CLI::App& app) {
   AddOutputOption(*command, options->stage);
   return [command, options] {
     if (!command->parsed()) return -1;
-    return options->machines.empty() ? RunMerge(*options) : MergeMachines(*options);
+    bool machines = !options->machines.empty() || !options->machineList.empty();
+    return machines ? MergeMachines(*options) : RunMerge(*options);
   };
 }
 

@@ -146,16 +146,18 @@ TEST_F(FleetTest, ManyMachinesMergeAsEachAfterTheOtherInTheOrderOfTheirNames) {
     std::filesystem::remove(tree_.Native("each.xml"));
     for (const auto* run : {&c.machines, &c.again}) {
       if (run->empty()) continue;
-      std::string files;
+      std::string list;  // the files, in the order given
       std::map<std::string, std::string> byName;
       for (size_t i = 0; i < run->size(); ++i) {
         std::vector<std::string> part = Split((*run)[i], '|');
         std::string file = "m" + std::to_string(i) + ".xml";
         AddMachine(file, part[0], part[1], part[2]);
-        files += " @" + file;
+        list += tree_.Native(file) + "\n";
         byName[Lower(part[0])] = file;
       }
-      EXPECT_EQ(Run("merge -q --user-data @all.xml --save" + files).first, kExitOk);
+      tree_.AddFile("list.txt", list);
+      EXPECT_EQ(Run("merge -q --user-data @all.xml --save --machine-list @list.txt").first,
+                kExitOk);
       for (const auto& [name, file] : byName) {
         EXPECT_EQ(Run("merge -q --user-data @each.xml --save @" + file).first, kExitOk);
       }
