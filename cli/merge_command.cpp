@@ -158,9 +158,10 @@ int MergeMachines(const MergeOptions& options) {
   merge.EndSequence();
 
   TextPieces text = [&](const auto& put) { userData->WriteXml(put); };
-  if (options.save && merged > 0) {
-    bool replaced =
-        ReplaceFileAtomically(options.userData, text, {.keepBackup = true, .keepSame = true});
+  if (options.save) {
+    // With nothing merged the file is left alone: even an upgrade would be a change of no run's.
+    bool replaced = merged > 0 && ReplaceFileAtomically(options.userData, text,
+                                                        {.keepBackup = true, .keepSame = true});
     if (!options.stage.quiet) {
       fmt::print(stderr, "trllocator: merged the results of {} machine{} into '{}'{}\n", merged,
                  merged == 1 ? "" : "s", options.userData, replaced ? "" : ", which is unchanged");
