@@ -33,12 +33,12 @@ build_dir="${1:-$here/build}"
 packages=(
   g++ cmake ninja-build pkg-config
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev nlohmann-json3-dev
-  libsqlite3-dev
+  libsqlite3-dev zlib1g-dev
 )
 if ((tests)); then
   packages+=(libgtest-dev libgmock-dev)
-  # The CycloneDX schema the tests validate against comes from npm.
-  packages+=(python3-jsonschema)
+  # The CycloneDX schema the tests validate against comes from npm; the fleet test runs Ansible.
+  packages+=(python3-jsonschema ansible)
   command -v npm >/dev/null || packages+=(npm)
 fi
 if ((bench)); then

@@ -7,13 +7,17 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <optional>
 #include <random>
+#include <string_view>
 
 #include "chunk_writer.h"
 #include "command_error.h"
+#include "gzip_text.h"
 
 namespace trl::cli {
 namespace {
@@ -47,12 +51,58 @@ class Descriptor {
   int fd_;
 };
 
-// Writes the text and a line end, gathered into large writes. False with errno set when a write
-// failed.
-bool WritePieces(int fd, const TextPieces& text) {
+// Tells whether the bytes handed to it, in order, are exactly what a file holds.
+class SameAsFile {
+ public:
+  explicit SameAsFile(const std::string& path)
+      : file_(::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC)), same_(file_.Get() >= 0) {}
+  void Put(std::string_view bytes) {
+    while (same_ && !bytes.empty()) {
+      if (at_ == held_.size() && !Fill()) same_ = false;
+      size_t n = std::min(bytes.size(), held_.size() - at_);
+      same_ = same_ && bytes.substr(0, n) == std::string_view(held_).substr(at_, n);
+      bytes.remove_prefix(n);
+      at_ += n;
+    }
+  }
+  // Whether the file ended where the bytes did.
+  bool Same() { return same_ && at_ == held_.size() && !Fill(); }
+
+ private:
+  bool Fill() {
+    held_.resize(size_t{1} << 16);
+    ssize_t got;
+    do {
+      got = ::read(file_.Get(), held_.data(), held_.size());
+    } while (got < 0 && errno == EINTR);
+    held_.resize(got > 0 ? static_cast<size_t>(got) : 0);
+    at_ = 0;
+    return got > 0;
+  }
+
+  Descriptor file_;
+  bool same_;
+  std::string held_;
+  size_t at_ = 0;
+};
+
+// Writes the text and a line end, gathered into large writes, compressed when asked, and shows
+// each byte written to `same` when there is one. False with errno set when a write failed.
+bool WritePieces(int fd, const TextPieces& text, bool compress, SameAsFile* same) {
   ChunkWriter writer(fd);
-  text([&](std::string_view piece) { writer.Put(piece); });
-  writer.Put("\n");
+  auto write = [&](std::string_view bytes) {
+    writer.Put(bytes);
+    if (same != nullptr) same->Put(bytes);
+  };
+  if (!compress) {
+    text(write);
+    write("\n");
+    return writer.Finish();
+  }
+  GzipWriter gzip(write);
+  text([&](std::string_view piece) { gzip.Put(piece); });
+  gzip.Put("\n");
+  gzip.Finish();
   return writer.Finish();
 }
 
@@ -170,13 +220,13 @@ std::string SaveTarget(const std::string& path) {
   return target.string();
 }
 
-void ReplaceFileAtomically(const std::string& path, const std::string& text,
+bool ReplaceFileAtomically(const std::string& path, const std::string& text,
                            const Replacement& how) {
-  ReplaceFileAtomically(
+  return ReplaceFileAtomically(
       path, [&](const auto& put) { put(text); }, how);
 }
 
-void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
+bool ReplaceFileAtomically(const std::string& path, const TextPieces& text,
                            const Replacement& how) {
   std::string file = how.throughLink ? SaveTarget(path) : path;
   struct stat existing {};
@@ -193,8 +243,11 @@ void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
   if (fd.Get() < 0) Fail("write", file, errno);
   KeepOwnership(fd.Get(), exists ? &existing : nullptr);
   bool written = false;
+  std::optional<SameAsFile> same;
+  if (how.keepSame && exists) same.emplace(file);
   try {
-    written = WritePieces(fd.Get(), text) && ::fsync(fd.Get()) == 0;
+    written = WritePieces(fd.Get(), text, how.compress, same ? &*same : nullptr) &&
+              ::fsync(fd.Get()) == 0;
   } catch (...) {
     ::unlink(temporary.c_str());
     throw;
@@ -203,6 +256,10 @@ void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
   if (!written) {
     ::unlink(temporary.c_str());
     Fail("write", file, error);
+  }
+  if (same && same->Same()) {
+    ::unlink(temporary.c_str());
+    return false;
   }
   if (how.keepBackup && exists) {
     try {
@@ -219,6 +276,7 @@ void ReplaceFileAtomically(const std::string& path, const TextPieces& text,
   }
   SyncFolderOf(file);
   if ((error = fd.Close()) != 0) Fail("write", file, error);
+  return true;
 }
 
 }  // namespace trl::cli

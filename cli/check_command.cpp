@@ -17,7 +17,8 @@ constexpr DocumentRole kAnyRole{
     "document",
     {DocumentKind::kSearchOptions, DocumentKind::kApplicationOptions, DocumentKind::kFingerprint,
      DocumentKind::kLocalFiles, DocumentKind::kResults, DocumentKind::kEmptyResults,
-     DocumentKind::kOther}};
+     DocumentKind::kMachineResults, DocumentKind::kOther},
+    true};
 
 int Check(const std::vector<std::string>& files) {
   int status = kExitOk;

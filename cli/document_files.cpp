@@ -13,6 +13,7 @@
 
 #include "atomic_file.h"
 #include "command_error.h"
+#include "gzip_text.h"
 #include "platform/fs/posix/output_open.h"
 
 namespace trl::cli {
@@ -44,7 +45,23 @@ xml::DocumentPtr LoadDocumentFile(const std::string& path, const DocumentRole& d
     }
   }
   auto document = std::make_shared<xml::Document>();
-  if (!document->Load(path)) {
+  bool loaded = false;
+  if (documentRole.compressed && IsGzipFile(path)) {
+    bool over = false;
+    std::string reason;
+    std::string text = InflateFile(path, xml::Limits().bytes, over, reason);
+    if (!reason.empty()) throw unreadable(reason);
+    if (over) {
+      throw CommandError(
+          fmt::format("the {} '{}' is over a limit: it holds more than {} bytes "
+                      "of text",
+                      role, path, xml::Limits().bytes));
+    }
+    loaded = document->LoadXml(text);
+  } else {
+    loaded = document->Load(path);
+  }
+  if (!loaded) {
     const xml::ParseError& error = document->LastParseError();
     if (error.line == 0) throw unreadable(error.reason);
     throw CommandError(fmt::format("the {} '{}' {}: line {}, column {}: {}", role, path,

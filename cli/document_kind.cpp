@@ -19,6 +19,7 @@ DocumentKind KindOf(xml::Document& document) {
     return DocumentKind::kEmptyResults;
   }
   if (name == "events" || name == "e") return DocumentKind::kOther;
+  if (name == "trl_machine") return DocumentKind::kMachineResults;
   if (name == "trl_fingerprint" || has("a/v") || has("a/f") || has("a/a")) {
     return DocumentKind::kFingerprint;
   }
@@ -44,6 +45,8 @@ std::string_view KindName(DocumentKind kind) {
       return "results or user data (applications found)";
     case DocumentKind::kEmptyResults:
       return "an empty results document";
+    case DocumentKind::kMachineResults:
+      return "the results of one machine (what collect writes)";
     case DocumentKind::kOther:
       return "a document of events or progress";
     case DocumentKind::kUnknown:

@@ -15,15 +15,18 @@ enum class DocumentKind {
   kApplicationOptions,
   kFingerprint,
   kLocalFiles,
-  kResults,       // matches or user data: applications found
-  kEmptyResults,  // a results root with nothing in it: local files, matches or user data
-  kOther,         // events, progress: never an input
+  kResults,         // matches or user data: applications found
+  kEmptyResults,    // a results root with nothing in it: local files, matches or user data
+  kMachineResults,  // what `collect` wrote on one machine: its search options and filtered results
+  kOther,           // events, progress: never an input
 };
 
-// What a document option takes: its name in messages and the kinds it accepts.
+// What a document option takes: its name in messages, the kinds it accepts, and whether its file
+// may be gzip-compressed.
 struct DocumentRole {
   std::string_view name;
   std::initializer_list<DocumentKind> accepts;
+  bool compressed = false;
 };
 
 inline constexpr DocumentRole kSearchOptionsRole{"search options", {DocumentKind::kSearchOptions}};
@@ -39,6 +42,8 @@ inline constexpr DocumentRole kNewResultsRole{
     "new results", {DocumentKind::kResults, DocumentKind::kEmptyResults}};
 inline constexpr DocumentRole kUserDataRole{"user data",
                                             {DocumentKind::kResults, DocumentKind::kEmptyResults}};
+inline constexpr DocumentRole kMachineResultsRole{
+    "machine results", {DocumentKind::kMachineResults}, true};
 
 DocumentKind KindOf(xml::Document& document);
 // How a kind is named in messages: "a fingerprint database".

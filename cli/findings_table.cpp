@@ -47,6 +47,16 @@ std::string Key(const xml::Node& c, const xml::Node& m, const xml::Node& d, cons
                      AttributeText(a, vocab::a_id));
 }
 
+// The computer (its c_id) a missing-list entry went missing from, as its place key a_guid
+// ("c3m1d7a2") names it, when `computers` has it; "" (any computer) otherwise.
+std::string MissingFrom(const xml::Node& a, const std::set<std::string>& computers) {
+  std::string key = AttributeText(a, vocab::a_guid);
+  size_t drive = key.find('m');
+  if (!key.starts_with('c') || drive == std::string::npos) return "";
+  std::string computer = key.substr(1, drive - 1);
+  return computers.count(computer) != 0 ? computer : "";
+}
+
 size_t MissingCount(xml::Document& document) {
   xml::Node root = document.DocumentElement();
   if (!root) return 0;
@@ -172,13 +182,14 @@ Inventory::Inventory(xml::Document& userData) : missing_(MissingCount(userData))
                        AttributeText(c, vocab::c_local) == "1"),
               AttributeText(a, vocab::a_name), AttributeText(a, vocab::v_id),
               AttributeText(a, vocab::v_name), AttributeText(a, vocab::a_id),
-              AttributeText(c, vocab::c_local) == "1"});
+              AttributeText(c, vocab::c_id), AttributeText(c, vocab::c_local) == "1"});
   });
 }
 
 std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fingerprint) const {
   VersionNames names(fingerprint);
   std::vector<Finding> findings;
+  std::vector<std::string> computerIds;  // of each finding's computer
   std::set<std::string> present;
   ForEachApplication(merged, [&](xml::Node c, xml::Node m, xml::Node d, xml::Node a) {
     std::string key = Key(c, m, d, a);
@@ -204,34 +215,48 @@ std::vector<Finding> Inventory::Changes(xml::Document& merged, xml::Document& fi
           before->second.versionName;
     }
     findings.push_back(std::move(finding));
+    computerIds.push_back(AttributeText(c, vocab::c_id));
   });
 
   // Applications this run moved to the missing list are no longer in the tree; those an earlier
-  // run moved there stay listed (the list keeps its entries) even when found again.
-  std::multiset<std::string> gone;
-  std::set<std::string> listed;
+  // run moved there stay listed (the list keeps its entries) even when found again. An entry
+  // names the computer it went missing from by its place key: one of many computers does not
+  // stand for the same application on another.
+  std::set<std::string> computers;
+  for (const auto& [key, entry] : entries_) computers.insert(entry.computerId);
+  std::multiset<std::pair<std::string, std::string>> gone;
+  std::set<std::pair<std::string, std::string>> listed;
   xml::Node root = merged.DocumentElement();
   size_t seen = 0;
   if (root) {
+    for (xml::Node c : root.ChildElements(vocab::c))
+      computers.insert(AttributeText(c, vocab::c_id));
     for (xml::Node list : root.ChildElements(vocab::a_missing_list)) {
       for (xml::Node a : list.ChildElements(vocab::a)) {
+        std::pair<std::string, std::string> what{MissingFrom(a, computers),
+                                                 AttributeText(a, vocab::a_id)};
         if (seen++ >= missing_) {
-          gone.insert(AttributeText(a, vocab::a_id));
+          gone.insert(what);
         } else {
-          listed.insert(AttributeText(a, vocab::a_id));
+          listed.insert(what);
         }
       }
     }
   }
-  for (Finding& finding : findings) {
-    if (listed.count(finding.applicationId) == 0) continue;
+  for (size_t i = 0; i < findings.size(); ++i) {
+    Finding& finding = findings[i];
+    if (listed.count({computerIds[i], finding.applicationId}) == 0 &&
+        listed.count({"", finding.applicationId}) == 0) {
+      continue;
+    }
     finding.stillMissing = true;
     finding.change += finding.change.empty() ? "" : "; ";
     finding.change += "still on the missing list";
   }
   for (const auto& [key, entry] : entries_) {
     if (present.count(key) != 0) continue;
-    auto match = gone.find(entry.applicationId);
+    auto match = gone.find({entry.computerId, entry.applicationId});
+    if (match == gone.end()) match = gone.find({"", entry.applicationId});
     if (match == gone.end()) continue;
     gone.erase(match);
     Finding finding{entry.computer,    entry.folder, entry.application,

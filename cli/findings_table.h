@@ -40,7 +40,7 @@ class Inventory {
 
  private:
   struct Entry {
-    std::string computer, folder, application, versionId, versionName, applicationId;
+    std::string computer, folder, application, versionId, versionName, applicationId, computerId;
     bool local = false;
   };
   std::map<std::string, Entry> entries_;  // by place and application id

@@ -33,14 +33,16 @@ bool Below(const std::string& folder, const std::string& root) {
 
 }  // namespace
 
-void ListManagedApplications(xml::Document& searchOptions, xml::Document& userData) {
-  xml::Node m = searchOptions.DocumentElement().SelectSingleNode("c/m");
-  std::vector<std::string> roots;
-  for (const xml::Node& d : m.ChildElements(vocab::d))
-    roots.push_back(*d.GetAttribute(vocab::d_text));
-  xml::Node root = userData.DocumentElement();
-  if (!root) return;
-  for (const xml::Node& a : root.SelectNodes("c[@c_local='1']/m[@m_name='']/d/a[@a_manage='1']")) {
+namespace {
+
+// Adds to the drive `m` of the search options a folder entry for each of `applications` (managed
+// applications of the user data) whose folder lies below one of `roots`, so that one no longer
+// found there is reported missing.
+void ListManagedBelow(xml::Document& searchOptions, xml::Node m,
+                      const std::vector<std::string>& roots,
+                      const std::vector<xml::Node>& applications) {
+  size_t folders = m.ChildElements(vocab::d).size();
+  for (const xml::Node& a : applications) {
     xml::Node d = a.ParentNode();
     std::string folder = d.GetAttribute(vocab::d_text).value_or("");
     if (std::none_of(roots.begin(), roots.end(),
@@ -48,13 +50,54 @@ void ListManagedApplications(xml::Document& searchOptions, xml::Document& userDa
       continue;
     }
     xml::Node place = m.AppendChild(searchOptions.CreateElement(vocab::d));
-    place.SetAttribute(vocab::d_id, std::to_string(m.ChildElements(vocab::d).size()));
+    place.SetAttribute(vocab::d_id, std::to_string(++folders));
     place.SetAttribute(vocab::d_text, folder);
     place.SetAttribute(vocab::d_name, d.GetAttribute(vocab::d_name).value_or(""));
     xml::Node managed = place.AppendChild(searchOptions.CreateElement(vocab::a));
     managed.SetAttribute(vocab::a_id, a.GetAttribute(vocab::a_id).value_or(""));
     managed.SetAttribute(vocab::a_name, a.GetAttribute(vocab::a_name).value_or(""));
     managed.SetAttribute(vocab::a_manage, "1");
+  }
+}
+
+}  // namespace
+
+void ListManagedApplications(xml::Document& searchOptions, xml::Document& userData) {
+  xml::Node m = searchOptions.DocumentElement().SelectSingleNode("c/m");
+  std::vector<std::string> roots;
+  for (const xml::Node& d : m.ChildElements(vocab::d))
+    roots.push_back(*d.GetAttribute(vocab::d_text));
+  xml::Node root = userData.DocumentElement();
+  if (!root) return;
+  ListManagedBelow(searchOptions, m, roots,
+                   root.SelectNodes("c[@c_local='1']/m[@m_name='']/d/a[@a_manage='1']"));
+}
+
+void ListManagedApplicationsByName(xml::Document& searchOptions, xml::Document& userData) {
+  xml::Node root = userData.DocumentElement();
+  if (!root) return;
+  for (const xml::Node& c : searchOptions.DocumentElement().ChildElements(vocab::c)) {
+    xml::Node computer = userData.FindChild(root, vocab::c, vocab::c_name,
+                                            c.GetAttribute(vocab::c_name).value_or(""));
+    if (!computer) continue;
+    for (const xml::Node& m : c.ChildElements(vocab::m)) {
+      xml::Node drive = userData.FindChild(computer, vocab::m, vocab::m_name,
+                                           m.GetAttribute(vocab::m_name).value_or(""));
+      if (!drive) continue;
+      std::vector<std::string> roots;
+      for (const xml::Node& d : m.ChildElements(vocab::d)) {
+        if (d.GetAttribute(vocab::d_search) == "1") {
+          roots.push_back(d.GetAttribute(vocab::d_text).value_or(""));
+        }
+      }
+      std::vector<xml::Node> managed;
+      for (const xml::Node& d : drive.ChildElements(vocab::d)) {
+        for (const xml::Node& a : d.ChildElements(vocab::a)) {
+          if (a.GetAttribute(vocab::a_manage) == "1") managed.push_back(a);
+        }
+      }
+      ListManagedBelow(searchOptions, m, roots, managed);
+    }
   }
 }
 

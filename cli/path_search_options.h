@@ -21,5 +21,8 @@ void ExcludeFolders(xml::Document& searchOptions, const std::vector<std::string>
 // computer that `userData` holds below the searched folders, each at its own place, so that one
 // no longer found there is reported missing.
 void ListManagedApplications(xml::Document& searchOptions, xml::Document& userData);
+// The same for each computer and drive of `searchOptions` that `userData` holds, found by their
+// encoded names: below the folders searched there (d_search "1").
+void ListManagedApplicationsByName(xml::Document& searchOptions, xml::Document& userData);
 
 }  // namespace trl::cli

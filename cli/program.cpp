@@ -5,6 +5,7 @@
 #include <string>
 
 #include "check_command.h"
+#include "collect_command.h"
 #include "command_error.h"
 #include "compare_command.h"
 #include "explain_command.h"
@@ -33,7 +34,7 @@ Program::Program()
   commands_ = {AddSearchCommand(app_),    AddCompareCommand(app_), AddFilterCommand(app_),
                AddMergeCommand(app_),     AddLocateCommand(app_),  AddFingerprintCommand(app_),
                AddInventoryCommand(app_), AddManageCommand(app_),  AddCheckCommand(app_),
-               AddExplainCommand(app_)};
+               AddExplainCommand(app_),   AddCollectCommand(app_)};
 }
 
 int Program::Run(int argc, char** argv) {

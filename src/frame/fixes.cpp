@@ -24,38 +24,53 @@ void UpgradeName(const OnError& on, const Schema& schema, xml::Node node, std::s
   on([&] { node.SetAttribute(nameAttr, schema.EncodeName(TextOf(node, nameAttr))); });
 }
 
+// The ids read last: one that cannot be read keeps the value the element before it gave.
+struct PlaceIds {
+  std::string c, m, d, a;
+};
+
+void UpgradeComputerIn(const OnError& on, const Schema& schema, xml::Node c, PlaceIds& ids) {
+  on([&] { ids.c = TextOf(c, vocab::c_id); });
+  UpgradeName(on, schema, c, vocab::c_text, vocab::c_name);
+
+  std::vector<xml::Node> drives;
+  on([&] { drives = c.SelectNodes("./m"); });
+  for (xml::Node m : drives) {
+    on([&] { ids.m = TextOf(m, vocab::m_id); });
+    UpgradeName(on, schema, m, vocab::m_text, vocab::m_name);
+
+    std::vector<xml::Node> folders;
+    on([&] { folders = m.SelectNodes("./d"); });
+    for (xml::Node d : folders) {
+      on([&] { ids.d = TextOf(d, vocab::d_id); });
+      std::vector<xml::Node> applications;
+      on([&] { applications = d.SelectNodes("./a"); });
+      for (xml::Node a : applications) {
+        on([&] { ids.a = TextOf(a, vocab::a_id); });
+        on([&] {
+          a.SetAttribute(vocab::a_guid, "c" + ids.c + "m" + ids.m + "d" + ids.d + "a" + ids.a);
+        });
+      }
+    }
+  }
+}
+
 }  // namespace
 
 void UpgradeUserData(xml::Document& document) {
   OnError on{kFixesModule, "UpgradeUserData"};
   Schema schema;
-  std::string cId, mId, dId, aId;
-
+  PlaceIds ids;
   std::vector<xml::Node> computers;
   on([&] { computers = document.DocumentElement().SelectNodes("//c"); });
-  for (xml::Node c : computers) {
-    on([&] { cId = TextOf(c, vocab::c_id); });
-    UpgradeName(on, schema, c, vocab::c_text, vocab::c_name);
+  for (xml::Node c : computers) UpgradeComputerIn(on, schema, c, ids);
+}
 
-    std::vector<xml::Node> drives;
-    on([&] { drives = c.SelectNodes("./m"); });
-    for (xml::Node m : drives) {
-      on([&] { mId = TextOf(m, vocab::m_id); });
-      UpgradeName(on, schema, m, vocab::m_text, vocab::m_name);
-
-      std::vector<xml::Node> folders;
-      on([&] { folders = m.SelectNodes("./d"); });
-      for (xml::Node d : folders) {
-        on([&] { dId = TextOf(d, vocab::d_id); });
-        std::vector<xml::Node> applications;
-        on([&] { applications = d.SelectNodes("./a"); });
-        for (xml::Node a : applications) {
-          on([&] { aId = TextOf(a, vocab::a_id); });
-          on([&] { a.SetAttribute(vocab::a_guid, "c" + cId + "m" + mId + "d" + dId + "a" + aId); });
-        }
-      }
-    }
-  }
+void UpgradeComputer(xml::Node computer) {
+  OnError on{kFixesModule, "UpgradeUserData"};
+  Schema schema;
+  PlaceIds ids;
+  UpgradeComputerIn(on, schema, computer, ids);
 }
 
 void UpgradeFingerprintData(xml::Document& fingerprint) {

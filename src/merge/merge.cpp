@@ -1,6 +1,7 @@
 #include "trl/merge.h"
 
 #include <algorithm>
+#include <unordered_set>
 #include <vector>
 
 #include "frame/attributes.h"
@@ -11,6 +12,7 @@
 #include "frame/highest_id.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
+#include "merge/id_ledger.h"
 #include "merge/merge_names.h"
 #include "merge/place_index.h"
 #include "platform/convert.h"
@@ -99,6 +101,13 @@ void Merge::RunBody() { Run(); }
 void Merge::Run() {
   OnError on{kClass, merge::kMergeLabel};
   BeginRun(on);
+  MergeResults();
+  SettleStatus();
+  EndRun(on);
+}
+
+void Merge::MergeResults() {
+  OnError on{kClass, merge::kMergeLabel};
   Defaults defaults;
   xml::Node oldRoot;
   on([&] { oldRoot = objOldResultsDOM->DocumentElement(); });
@@ -111,38 +120,43 @@ void Merge::Run() {
 
   std::vector<xml::Node> computers;
   on([&] { computers = EveryElement(*objNewResultsDOM, vocab::c); });
-  // A find-or-add that fails leaves the element it last gave in use, as a failed step does.
+  // A find-or-add that fails leaves the element it last gave in use, as a failed step does. What
+  // a find-or-add adds is numbered from its counter, which tells a sequence what joined the tree.
   xml::Node oldComputer, oldDrive, oldFolder;
+  auto findOrAdd = [&](xml::Node& element, int32_t& counter, const auto& add) {
+    int32_t before = counter;
+    on([&] { element = add(); });
+    if (sequence_ && counter != before) on([&] { NoteAdded(element); });
+  };
   bool going = true;
   // A computer can stand inside an application that is moved to the user data.
   VisitRemaining(computers, vocab::c, [&](const xml::Node& c) {
-    on([&] {
-      oldComputer = Use(objSchema).AddComputer(TextOf(c, vocab::c_text), TextOf(c, vocab::c_name),
-                                               oldRoot, lngComputerCounter);
+    findOrAdd(oldComputer, lngComputerCounter, [&] {
+      return Use(objSchema).AddComputer(TextOf(c, vocab::c_text), TextOf(c, vocab::c_name), oldRoot,
+                                        lngComputerCounter);
     });
+    if (sequence_ && oldComputer) sequence_->touched.push_back(oldComputer);
     std::vector<xml::Node> drives;
     on([&] { drives = c.ChildElements(vocab::m); });
     for (size_t mi = 0; going && mi < drives.size(); ++mi) {
       const xml::Node& m = drives[mi];
-      on([&] {
-        oldDrive = Use(objSchema).AddDrive(TextOf(m, vocab::m_text), TextOf(m, vocab::m_name),
-                                           oldComputer, lngDriveCounter);
+      findOrAdd(oldDrive, lngDriveCounter, [&] {
+        return Use(objSchema).AddDrive(TextOf(m, vocab::m_text), TextOf(m, vocab::m_name),
+                                       oldComputer, lngDriveCounter);
       });
       std::vector<xml::Node> folders;
       on([&] { folders = m.ChildElements(vocab::d); });
       for (size_t di = 0; going && di < folders.size(); ++di) {
         const xml::Node& d = folders[di];
-        on([&] {
-          oldFolder = Use(objSchema).AddFolder(TextOf(d, vocab::d_text), TextOf(d, vocab::d_name),
-                                               oldDrive, lngFolderCounter);
+        findOrAdd(oldFolder, lngFolderCounter, [&] {
+          return Use(objSchema).AddFolder(TextOf(d, vocab::d_text), TextOf(d, vocab::d_name),
+                                          oldDrive, lngFolderCounter);
         });
         going = MergeFolder(d, oldFolder, defaults);
       }
     }
     return going;
   });
-  SettleStatus();
-  EndRun(on);
 }
 
 bool Merge::MergeFolder(xml::Node newFolder, xml::Node oldFolder, const Defaults& defaults) {
@@ -187,6 +201,85 @@ void Merge::ReleaseDocuments() {
   objOldResultsDOM.reset();
   objSearchOptionsDOM.reset();
   objApplicationOptionsDOM.reset();
+}
+
+bool Merge::BeginSequence(xml::DocumentPtr applicationOptions, xml::DocumentPtr oldResults) {
+  if (sequence_ || status_ == kStatusStarted || status_ == kStatusRunning) return false;
+  OnError on{kClass, merge::kStartLabel};
+  sequence_ = std::make_unique<Sequence>();
+  sequence_->asynchronous = Asynchronous();
+  Asynchronous(false);
+  status_ = kStatusRunning;
+  objApplicationOptionsDOM =
+      applicationOptions ? applicationOptions : std::make_shared<xml::Document>();
+  objOldResultsDOM = oldResults;
+  on([&] {
+    if (!objOldResultsDOM) objOldResultsDOM = EmptyResults();
+  });
+  newPlaces_.reset();
+  oldPlaces_.reset();
+  missingList_ = xml::Node();
+  on([&] {
+    sequence_->ids = std::make_unique<merge::IdLedger>(on, Use(objOldResultsDOM).DocumentElement());
+  });
+  on([&] { UpgradeUserData(Use(objOldResultsDOM)); });
+  e_match_total_new = e_match_merged = e_match_missing = 0;
+  on([&] {
+    e_match_total_old =
+        ToInt32(static_cast<double>(EveryElement(*objOldResultsDOM, vocab::a).size()));
+  });
+  return true;
+}
+
+void Merge::MergeNext(xml::DocumentPtr searchOptions, xml::DocumentPtr newResults) {
+  if (!sequence_) return;
+  OnError on{kClass, merge::kStartLabel};
+  objSearchOptionsDOM = searchOptions ? searchOptions : std::make_shared<xml::Document>();
+  objNewResultsDOM = newResults;
+  on([&] {
+    if (!objNewResultsDOM) objNewResultsDOM = EmptyResults();
+  });
+  newPlaces_.reset();
+  // The upgrade a Start gives the whole of the old results changes only the place keys of the
+  // applications the run before moved in, which still carry those of the results they came from.
+  std::unordered_set<const void*> upgraded;
+  for (const xml::Node& c : sequence_->touched) {
+    if (upgraded.insert(c.Id()).second) UpgradeComputer(c);
+  }
+  sequence_->touched.clear();
+  lngComputerCounter = lngDriveCounter = lngFolderCounter = 0;
+  on([&] {
+    lngComputerCounter = Use(sequence_->ids).Highest(vocab::c);
+    lngDriveCounter = sequence_->ids->Highest(vocab::m);
+    lngFolderCounter = sequence_->ids->Highest(vocab::d);
+  });
+  on([&] { UpgradeUserData(Use(objNewResultsDOM)); });
+  on([&] {
+    e_match_total_new =
+        CheckedAdd(e_match_total_new,
+                   ToInt32(static_cast<double>(EveryElement(*objNewResultsDOM, vocab::a).size())));
+  });
+  MergeResults();
+  objNewResultsDOM.reset();
+  objSearchOptionsDOM.reset();
+}
+
+void Merge::EndSequence() {
+  if (!sequence_) return;
+  status_ = kStatusComplete;
+  Asynchronous(sequence_->asynchronous);
+  sequence_.reset();
+  ReleaseDocuments();
+}
+
+void Merge::NoteRemoving(const xml::Node& node) {
+  if (oldPlaces_) oldPlaces_->Removing(node);
+  if (sequence_ && sequence_->ids) sequence_->ids->Removing(node);
+}
+
+void Merge::NoteAdded(const xml::Node& node) {
+  if (oldPlaces_) oldPlaces_->Added(node);
+  if (sequence_ && sequence_->ids) sequence_->ids->Added(node);
 }
 
 }  // namespace trl

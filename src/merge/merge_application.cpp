@@ -70,7 +70,11 @@ void Merge::MergeApplication(xml::Node application, xml::Node oldFolder, const D
   }
 
   xml::Node merged = application;
-  on([&] { merged = oldFolder.ReplaceChild(application, old); });
+  bool placed = on([&] {
+    if (sequence_) NoteRemoving(old);
+    merged = oldFolder.ReplaceChild(application, old);
+  });
+  if (sequence_ && placed) on([&] { NoteAdded(merged); });
   if (entry) on([&] { carried.AppendChild(entry); });
   if (carried) on([&] { merged.AppendChild(carried); });
 }

@@ -18,7 +18,10 @@ bool Merge::MissingApplicationsRefresh() {
   });
   if (managed.empty()) return true;
   on([&] { newPlaces_ = std::make_unique<merge::PlaceIndex>(Use(objNewResultsDOM)); });
-  on([&] { oldPlaces_ = std::make_unique<merge::PlaceIndex>(Use(objOldResultsDOM)); });
+  // A sequence keeps the old results' places from run to run, in step with their changes.
+  if (!oldPlaces_) {
+    on([&] { oldPlaces_ = std::make_unique<merge::PlaceIndex>(Use(objOldResultsDOM)); });
+  }
 
   // A value that cannot be read keeps what the application before gave.
   int32_t id = 0;
@@ -44,9 +47,10 @@ bool Merge::MissingApplicationsRefresh() {
     on([&] { old = Use(oldPlaces_).Find(computerName, driveName, folderName, idText); });
     if (old) MissingApplication(old);
   }
-  // The merge moves applications around: the places are only good for this check.
+  // The merge moves applications around: the places are only good for this check, unless a
+  // sequence keeps them in step.
   newPlaces_.reset();
-  oldPlaces_.reset();
+  if (!sequence_) oldPlaces_.reset();
   return true;
 }
 
@@ -110,14 +114,11 @@ void Merge::RemoveFromTree(const OnError& on, xml::Node application) {
   bool out = false;  // once a level has gone, what it held went with it
   auto takeOut = [&](xml::Node parent, xml::Node child) {
     out = on([&] {
-      if (child.ParentNode() == parent) Use(oldPlaces_).Removing(child);
+      if (child.ParentNode() == parent) NoteRemoving(child);
       parent.RemoveChild(child);
     });
   };
-  if (computerGoes) {
-    takeOut(root, computer);
-    if (out) on([&] { Use(oldPlaces_).ComputerRemoved(); });
-  }
+  if (computerGoes) takeOut(root, computer);
   if (driveEmpties && !out) takeOut(computer, drive);
   if (folderEmpties && !out) takeOut(drive, folder);
   if (!out) takeOut(folder, application);

@@ -16,6 +16,13 @@ xml::Node ParentNamed(const xml::Node& node, std::string_view tag) {
              : xml::Node();
 }
 
+// The `tag` elements among `node` and its descendants.
+std::vector<xml::Node> InOrBelow(const xml::Node& node, std::string_view tag) {
+  std::vector<xml::Node> found = node.GetElementsByTagName(tag);
+  if (node.NodeName() == tag) found.push_back(node);
+  return found;
+}
+
 }  // namespace
 
 PlaceIndex::PlaceIndex(xml::Document& document) : document_(document) {
@@ -55,9 +62,7 @@ xml::Node PlaceIndex::Find(const std::string& computer, const std::string& drive
 }
 
 void PlaceIndex::Removing(const xml::Node& node) {
-  std::vector<xml::Node> folders = node.GetElementsByTagName(vocab::d);
-  if (node.NodeName() == vocab::d) folders.push_back(node);
-  for (const xml::Node& d : folders) {
+  for (const xml::Node& d : InOrBelow(node, vocab::d)) {
     auto key = KeyOf(d);
     if (!key) continue;
     auto found = folders_.find(*key);
@@ -65,6 +70,14 @@ void PlaceIndex::Removing(const xml::Node& node) {
     std::vector<xml::Node>& list = found->second;
     list.erase(std::remove(list.begin(), list.end(), d), list.end());
   }
+  if (computers_) *computers_ -= std::min(*computers_, InOrBelow(node, vocab::c).size());
+}
+
+void PlaceIndex::Added(const xml::Node& node) {
+  for (const xml::Node& d : InOrBelow(node, vocab::d)) {
+    if (auto key = KeyOf(d)) folders_[*key].push_back(d);
+  }
+  if (computers_) *computers_ += InOrBelow(node, vocab::c).size();
 }
 
 size_t PlaceIndex::Computers() {
@@ -73,10 +86,6 @@ size_t PlaceIndex::Computers() {
         document_.DocumentElement() ? document_.AsNode().GetElementsByTagName(vocab::c).size() : 0;
   }
   return *computers_;
-}
-
-void PlaceIndex::ComputerRemoved() {
-  if (computers_ && *computers_ > 0) --*computers_;
 }
 
 }  // namespace trl::merge

@@ -25,12 +25,13 @@ class PlaceIndex {
   // across folders: both are answered by the selection itself.
   xml::Node Find(const std::string& computer, const std::string& drive, const std::string& folder,
                  const std::string& id);
-  // Call before `node` leaves the tree: the folders in or below it are forgotten.
+  // Call before `node` leaves the tree: the folders and computers in or below it are forgotten.
   void Removing(const xml::Node& node);
+  // Call once `node` has joined the tree: the folders and computers in or below it are known.
+  void Added(const xml::Node& node);
 
   // How many computers the document holds ("//c" counted), counted on first use.
   size_t Computers();
-  void ComputerRemoved();
 
  private:
   // The place key of a folder, or nothing when no place selection meets its applications.
