@@ -114,12 +114,7 @@ std::function<int()> AddCollectCommand(CLI::App& app) {
       "collect",
       "On one machine of a fleet: search, compare and filter, and write the machine's results "
       "for a central merge");
-  command->add_option("folders", options->paths,
-                      "Folders to search (instead of --search-options), each with everything "
-                      "below it");
-  command->add_option("--search-options", options->searchOptions, "Search options document");
-  command->add_option("--exclude", options->excluded,
-                      "Leave out the folders this glob matches, by name or by path (repeatable)");
+  AddFolderOptions(*command, options->paths, options->searchOptions, options->excluded);
   command->add_option("--application-options", options->applicationOptions,
                       "Application options document (which applications take part)");
   command->add_option("--fingerprint", options->fingerprint, "Fingerprint database")->required();

@@ -291,13 +291,8 @@ std::function<int()> AddLocateCommand(CLI::App& app) {
       "locate",
       "Find the known applications in the searched folders, identify their versions and merge "
       "the findings into the user data");
-  command->add_option("folders", options->paths,
-                      "Folders to search (instead of --search-options), each with everything "
-                      "below it");
-  command->add_option("--exclude", options->excluded,
-                      "Leave out the folders this glob matches, by name or by path (repeatable)");
-  command->add_option("--search-options", options->searchOptions,
-                      "Search options document (computers, drives, folders to search)");
+  AddFolderOptions(*command, options->paths, options->searchOptions, options->excluded,
+                   "Search options document (computers, drives, folders to search)");
   command->add_option("--application-options", options->applicationOptions,
                       "Application options document (which applications take part)");
   command->add_option("--fingerprint", options->fingerprint, "Fingerprint database");

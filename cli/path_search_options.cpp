@@ -154,4 +154,15 @@ xml::DocumentPtr SearchOptionsForPaths(const std::vector<std::string>& paths) {
   return document;
 }
 
+void AddFolderOptions(CLI::App& command, std::vector<std::string>& paths,
+                      std::string& searchOptions, std::vector<std::string>& excluded,
+                      const std::string& searchOptionsHelp) {
+  command.add_option("folders", paths,
+                     "Folders to search (instead of --search-options), each with everything below "
+                     "it");
+  command.add_option("--search-options", searchOptions, searchOptionsHelp);
+  command.add_option("--exclude", excluded,
+                     "Leave out the folders this glob matches, by name or by path (repeatable)");
+}
+
 }  // namespace trl::cli

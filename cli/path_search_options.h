@@ -1,11 +1,18 @@
 #pragma once
 
+#include <CLI/CLI.hpp>
 #include <string>
 #include <vector>
 
 #include "trl/xml.h"
 
 namespace trl::cli {
+
+// The options that say what a command searches: folders as arguments, --search-options (told as
+// `searchOptionsHelp`) in their place, and --exclude.
+void AddFolderOptions(CLI::App& command, std::vector<std::string>& paths,
+                      std::string& searchOptions, std::vector<std::string>& excluded,
+                      const std::string& searchOptionsHelp = "Search options document");
 
 // Search options for folders named on the command line, as any Linux tool takes them (relative
 // or absolute; a link is searched as given): the local computer, one folder entry per path, walked

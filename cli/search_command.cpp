@@ -62,12 +62,7 @@ std::function<int()> AddSearchCommand(CLI::App& app) {
   auto options = std::make_shared<SearchOptions>();
   CLI::App* command =
       app.add_subcommand("search", "Walk the folders of the search options and record the files");
-  command->add_option("folders", options->paths,
-                      "Folders to search (instead of --search-options), each with everything "
-                      "below it");
-  command->add_option("--search-options", options->searchOptions, "Search options document");
-  command->add_option("--exclude", options->excluded,
-                      "Leave out the folders this glob matches, by name or by path (repeatable)");
+  AddFolderOptions(*command, options->paths, options->searchOptions, options->excluded);
   command->add_option("--application-options", options->applicationOptions,
                       "Application options document (which applications take part)");
   command->add_option("--fingerprint", options->fingerprint,
