@@ -69,10 +69,7 @@ int RunCollect(const CollectOptions& options) {
   }
   int16_t filter = ParseFilterOptions(options.filter);
   std::string computer = options.computer.empty() ? ThisHostName() : options.computer;
-  auto searchOptions = options.paths.empty()
-                           ? LoadDocumentFile(options.searchOptions, kSearchOptionsRole)
-                           : SearchOptionsForPaths(options.paths);
-  if (!options.excluded.empty()) ExcludeFolders(*searchOptions, options.excluded);
+  auto searchOptions = GivenSearchOptions(options.paths, options.searchOptions, options.excluded);
   auto applicationOptions =
       LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
   auto fingerprint = LoadDocumentFile(options.fingerprint, kFingerprintRole);

@@ -8,6 +8,8 @@
 #include <filesystem>
 
 #include "command_error.h"
+#include "document_files.h"
+#include "document_kind.h"
 #include "frame/vocabulary.h"
 #include "platform/fs/file_system.h"
 #include "platform/text.h"
@@ -163,6 +165,14 @@ void AddFolderOptions(CLI::App& command, std::vector<std::string>& paths,
   command.add_option("--search-options", searchOptions, searchOptionsHelp);
   command.add_option("--exclude", excluded,
                      "Leave out the folders this glob matches, by name or by path (repeatable)");
+}
+
+xml::DocumentPtr GivenSearchOptions(const std::vector<std::string>& paths, const std::string& file,
+                                    const std::vector<std::string>& excluded) {
+  auto searchOptions =
+      paths.empty() ? LoadDocumentFile(file, kSearchOptionsRole) : SearchOptionsForPaths(paths);
+  if (!excluded.empty()) ExcludeFolders(*searchOptions, excluded);
+  return searchOptions;
 }
 
 }  // namespace trl::cli

@@ -14,6 +14,11 @@ void AddFolderOptions(CLI::App& command, std::vector<std::string>& paths,
                       std::string& searchOptions, std::vector<std::string>& excluded,
                       const std::string& searchOptionsHelp = "Search options document");
 
+// The search options a command was given: those of `paths` (see SearchOptionsForPaths), or else
+// the document `file`; either way without the folders `excluded` matches (see ExcludeFolders).
+xml::DocumentPtr GivenSearchOptions(const std::vector<std::string>& paths, const std::string& file,
+                                    const std::vector<std::string>& excluded);
+
 // Search options for folders named on the command line, as any Linux tool takes them (relative
 // or absolute; a link is searched as given): the local computer, one folder entry per path, walked
 // with recursion, every attribute admitted, links to folders noted. A path that is not a folder

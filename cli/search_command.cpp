@@ -27,10 +27,7 @@ int RunSearch(const SearchOptions& options) {
   if (options.paths.empty() == options.searchOptions.empty()) {
     throw CommandError("give the folders to search or --search-options (one of them)");
   }
-  auto searchOptions = options.paths.empty()
-                           ? LoadDocumentFile(options.searchOptions, kSearchOptionsRole)
-                           : SearchOptionsForPaths(options.paths);
-  if (!options.excluded.empty()) ExcludeFolders(*searchOptions, options.excluded);
+  auto searchOptions = GivenSearchOptions(options.paths, options.searchOptions, options.excluded);
   auto applicationOptions =
       LoadOptionalDocumentFile(options.applicationOptions, kApplicationOptionsRole);
   auto fingerprint = LoadOptionalDocumentFile(options.fingerprint, kFingerprintRole);
