@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
 # Installs the Debian packages trlLocator needs (only those missing), then configures and builds.
-# Usage: ./setup.sh [example] [tests] [bench] [fuzz] [package] [build-dir]   (default: build)
+# Usage: ./setup.sh [example] [tests] [bench] [fuzz] [package] [windows] [build-dir]   (default: build)
 #   example  also installs the Node.js packages Debian ships on their own that the bundled example
 #            looks for (semver, graceful-fs, which, nopt), so that the example finds real software
 #   tests    also installs what the tests need, and builds them (BUILD_TESTING=ON)
@@ -9,6 +9,9 @@
 #            builds the fuzz targets in a folder of their own
 #   package  also installs what making a Debian package needs, and builds nothing: .ci/package
 #            builds the package in a folder of its own
+#   windows  also installs the mingw-w64 cross compiler, widl, Wine and Wine's IDL files, and
+#            Debian's source package index (windows/deps.sh builds libraries from it), and builds
+#            nothing: .ci/windows builds trllocator.dll in a folder of its own
 set -euo pipefail
 
 here="$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)"
@@ -17,6 +20,7 @@ tests=0
 bench=0
 fuzz=0
 package=0
+windows=0
 while [ $# -gt 0 ]; do
   case "$1" in
     example) example=1 ;;
@@ -24,6 +28,7 @@ while [ $# -gt 0 ]; do
     bench) bench=1 ;;
     fuzz) fuzz=1 ;;
     package) package=1 ;;
+    windows) windows=1 ;;
     *) break ;;
   esac
   shift
@@ -55,6 +60,10 @@ if ((package)); then
   packages+=(dpkg-dev file)
 fi
 
+if ((windows)); then
+  packages+=(g++-mingw-w64-x86-64-posix mingw-w64-tools wine64 wine libwine-dev dpkg-dev)
+fi
+
 missing=()
 for p in "${packages[@]}"; do
   if ! dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q 'install ok installed'; then
@@ -62,19 +71,37 @@ for p in "${packages[@]}"; do
   fi
 done
 
-if ((${#missing[@]})); then
+# The Windows build's libraries come from Debian's source packages: their index is added beside
+# the binary one, from the same archives, where the machine has none.
+sources=()
+if ((windows)) && ! grep -Eqs '^(Types:.*deb-src|deb-src )' /etc/apt/sources.list \
+    /etc/apt/sources.list.d/*; then
+  sources=(/etc/apt/sources.list.d/trllocator-deb-src.sources)
+fi
+
+if ((${#missing[@]} || ${#sources[@]})); then
   sudo=()
   if [ "$(id -u)" -ne 0 ]; then
     command -v sudo >/dev/null || { echo "setup: need root or sudo to install: ${missing[*]}" >&2; exit 1; }
     sudo=(sudo)
   fi
-  echo "setup: installing ${missing[*]}"
+  if ((${#sources[@]})); then
+    echo "setup: adding Debian's source package index"
+    if [ -f /etc/apt/sources.list.d/debian.sources ]; then
+      sed 's/^Types: deb$/Types: deb-src/' /etc/apt/sources.list.d/debian.sources
+    else
+      sed -n 's/^deb /deb-src /p' /etc/apt/sources.list
+    fi | "${sudo[@]}" tee "${sources[0]}" >/dev/null
+  fi
   export DEBIAN_FRONTEND=noninteractive
   "${sudo[@]}" apt-get update -qq
-  "${sudo[@]}" apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
+  if ((${#missing[@]})); then
+    echo "setup: installing ${missing[*]}"
+    "${sudo[@]}" apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
+  fi
 fi
 
-if ((fuzz || package)); then
+if ((fuzz || package || windows)); then
   exit 0
 fi
 # A build folder configured before keeps its settings; the words turn on what they ask for.

@@ -271,11 +271,14 @@ typedef struct TrlConnectionPointVtbl {
  * document or factory of the library is alive and no lock is held, else TRL_S_FALSE. Registration
  * answers TRL_SELFREG_E_CLASS when the registry file cannot be written, TRL_E_ACCESSDENIED when the
  * system-wide file is asked for by a user other than root. Unregistration removes exactly the
- * lines this library's registration writes. */
+ * lines this library's registration writes. On Windows the platform's headers declare them, with
+ * its own types, for the module the Windows build makes. */
+#ifndef _WIN32
 TRL_SERVER_API TrlResult DllGetClassObject(const TrlGuid* clsid, const TrlGuid* iid, void** object);
 TRL_SERVER_API TrlResult DllCanUnloadNow(void);
 TRL_SERVER_API TrlResult DllRegisterServer(void);
 TRL_SERVER_API TrlResult DllUnregisterServer(void);
+#endif
 
 /* The class identifier of one of this library's programmatic names; TRL_E_INVALIDARG otherwise. */
 TRL_SERVER_API TrlResult TrlClassIdFromProgId(const char* progId, TrlGuid* clsid);
