@@ -9,7 +9,7 @@
 #            builds the fuzz targets in a folder of their own
 #   package  also installs what making a Debian package needs, and builds nothing: .ci/package
 #            builds the package in a folder of its own
-#   windows  also installs the mingw-w64 cross compiler, widl, Wine and Wine's IDL files, and
+#   windows  also installs the mingw-w64 cross compiler, widl, Wine (64-bit) and its IDL files, and
 #            Debian's source package index (windows/deps.sh builds libraries from it), and builds
 #            nothing: .ci/windows builds trllocator.dll in a folder of its own
 set -euo pipefail
