@@ -10,6 +10,7 @@
 #include <unordered_map>
 #include <unordered_set>
 #include <utility>
+#include <vector>
 
 #include "platform/failure.h"
 
@@ -21,6 +22,7 @@ namespace {
 
 constexpr UINT kRunPosted = WM_APP + 1;  // posted calls wait
 constexpr UINT kPassEnd = WM_APP + 2;    // wParam: the pass of Yield that posted it
+constexpr int kMostInputPerPass = 256;
 
 // The window class of the loop windows, registered once per module. The name holds the
 // procedure's address: a module unloaded and loaded again elsewhere registers a class of its own
@@ -136,6 +138,7 @@ struct EventLoop::State {
   std::unordered_map<uint64_t, Timer*> timers;
   uint64_t lastTimerId = 0;
   uint64_t lastPass = 0;
+  std::vector<uint64_t> openPasses;  // passes of Yield under way, outermost first
 
   HANDLE wakeEvent;
   HWND window;
@@ -193,8 +196,13 @@ void EventLoop::Post(std::function<void()> call) {
 void EventLoop::Yield() {
   State& state = *state_;
   // The queue up to a mark posted now: what the handlers post lands behind the mark and waits
-  // for the next pass. A nested pass passes an outer pass's mark on behind its own.
+  // for the next pass. A nested pass passes the mark of a pass still open on behind its own.
   uint64_t pass = ++state.lastPass;
+  state.openPasses.push_back(pass);
+  struct Close {
+    State& state;
+    ~Close() { state.openPasses.pop_back(); }
+  } close{state};
   PostMessageW(state.window, kPassEnd, static_cast<WPARAM>(pass), 0);
   MSG message;
   while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) {
@@ -204,9 +212,20 @@ void EventLoop::Yield() {
     }
     if (message.hwnd == state.window && message.message == kPassEnd) {
       if (message.wParam == pass) break;
-      PostMessageW(state.window, kPassEnd, message.wParam, 0);
+      if (std::find(state.openPasses.begin(), state.openPasses.end(), message.wParam) !=
+          state.openPasses.end()) {
+        PostMessageW(state.window, kPassEnd, message.wParam, 0);
+      }
       continue;
     }
+    TranslateMessage(&message);
+    DispatchMessageW(&message);
+  }
+  // Input and painting come after posted messages: a client's Cancel button is clicked here. A
+  // window that never validates would repaint forever, hence the bound.
+  for (int left = kMostInputPerPass;
+       left > 0 && PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE | PM_QS_INPUT | PM_QS_PAINT);
+       --left) {
     TranslateMessage(&message);
     DispatchMessageW(&message);
   }
