@@ -17,6 +17,7 @@ struct Item {
   std::string path;           // native, in the component's form; "C:\" for the root of a drive
   std::string folder;         // the path of the folder it is in; "" for a root
   std::string name;           // as the system spells it; "" for a root
+  bool root = false;          // of a drive, a share or the current drive
   bool mustBeFolder = false;  // the path ended with a separator
   ItemData data;
   bool IsFolder() const { return (data.attributes & FILE_ATTRIBUTE_DIRECTORY) != 0; }
@@ -56,7 +57,7 @@ class WindowsFileSystem final : public FileSystem {
   std::unique_ptr<File> GetFile(std::string_view path) override {
     Item item;
     if (DWORD error = Find(path, item)) Fail(FailureNumberOf(error, kFileNotFound));
-    if (item.IsFolder() || item.mustBeFolder || item.folder.empty()) Fail(kFileNotFound);
+    if (item.IsFolder() || item.mustBeFolder || item.root) Fail(kFileNotFound);
     return std::make_unique<WindowsFile>(std::move(item.folder), SpelledName(item.path, item.name),
                                          item.data);
   }
@@ -65,8 +66,10 @@ class WindowsFileSystem final : public FileSystem {
     Item item;
     if (DWORD error = Find(path, item)) Fail(FailureNumberOf(error, kPathNotFound));
     if (!item.IsFolder()) Fail(kPathNotFound);
-    std::string name = item.folder.empty() ? "" : SpelledName(item.path, item.name);
-    std::string spelled = item.folder.empty() ? item.path : ChildPath(item.folder, name);
+    std::string name = item.root ? "" : SpelledName(item.path, item.name);
+    std::string spelled = item.root             ? item.path
+                          : item.folder.empty() ? name
+                                                : ChildPath(item.folder, name);
     return std::make_unique<WindowsFolder>(std::move(spelled), std::move(name),
                                            item.data.attributes);
   }
@@ -88,23 +91,23 @@ class WindowsFileSystem final : public FileSystem {
     if (path.components.empty() && !path.absolute) return ERROR_PATH_NOT_FOUND;
     item.mustBeFolder = path.trailingSeparator;
     bool driveRoot = path.components.size() == 1 && !path.absolute && IsDrive(path.components[0]);
-    bool root = driveRoot || (path.network && path.components.size() == 2) ||
+    item.root = driveRoot || (path.network && path.components.size() == 2) ||
                 (path.absolute && !path.network && path.components.empty());
-    if (!root) {
+    if (!item.root) {
       item.name = path.components.back();
       path.components.pop_back();
       item.folder = path.Text();
       if (path.components.size() == 1 && !path.absolute && IsDrive(path.components[0])) {
         item.folder += "\\";
       }
-      item.path = ChildPath(item.folder, item.name);
+      item.path = item.folder.empty() ? item.name : ChildPath(item.folder, item.name);
     } else {
       item.path = path.Text();
       if (!item.path.ends_with('\\')) item.path += "\\";
       if (path.network) item.path.pop_back();  // "\\host\share", as the component writes it
     }
     DWORD error = ERROR_SUCCESS;
-    auto data = QueryItem(root && path.network ? item.path + "\\" : item.path, error);
+    auto data = QueryItem(item.root && path.network ? item.path + "\\" : item.path, error);
     if (!data) return error;
     item.data = *data;
     return ERROR_SUCCESS;

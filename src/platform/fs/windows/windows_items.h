@@ -33,7 +33,7 @@ class WindowsFile final : public File {
       : folder_(std::move(folder)), name_(std::move(name)), data_(data) {}
 
   std::string Name() const override { return name_; }
-  std::string Path() const override { return ChildPath(folder_, name_); }
+  std::string Path() const override { return folder_.empty() ? name_ : ChildPath(folder_, name_); }
   uint16_t Attributes(uint16_t wanted) const override;
   uint64_t Size() const override { return data_.size; }
   DateTime DateLastModified() const override;
