@@ -22,7 +22,7 @@
 #include "frame/vocabulary.h"
 #include "platform/clock.h"
 #include "platform/convert.h"
-#include "platform/fs/posix/posix_file_system.h"
+#include "platform/fs/system_file_system.h"
 #include "platform/text.h"
 #include "schema/schema.h"
 
@@ -37,11 +37,8 @@ constexpr int32_t kCompareMode = 2;
 }  // namespace
 
 Compare::Compare() : Compare(nullptr) {
-  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject", [] {
-    fs::ShareTable shares;
-    shares.AddSystemMounts();
-    return fs::CreatePosixFileSystem(std::move(shares));
-  });
+  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject",
+                                         [] { return fs::CreateSystemFileSystem(); });
 }
 
 Compare::Compare(std::unique_ptr<fs::FileSystem> fileSystem)

@@ -36,7 +36,11 @@ bool ReadNumber(std::string_view text, size_t& pos, int digits, bool atMost, int
 
 DateTime FromTimeT(std::time_t time) {
   std::tm parts{};
+#ifdef _WIN32
+  if (localtime_s(&parts, &time) != 0) Fail(kOverflow);
+#else
   if (localtime_r(&time, &parts) == nullptr) Fail(kOverflow);
+#endif
   return DateTime{parts.tm_year + 1900, parts.tm_mon + 1, parts.tm_mday,
                   parts.tm_hour,        parts.tm_min,     parts.tm_sec};
 }

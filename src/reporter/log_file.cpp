@@ -1,12 +1,9 @@
 #include "reporter/log_file.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <cerrno>
 
 #include "platform/failure.h"
-#include "platform/fs/posix/output_open.h"
+#include "platform/fs/output_stream.h"
 
 namespace trl {
 
@@ -14,14 +11,8 @@ void LogFile::Open(const std::string& path, bool replace) {
   Close();
   path_ = path;
   // A link planted where the log goes is not written through.
-  int fd = fs::OpenForWriting(path, O_CREAT | (replace ? O_TRUNC : O_APPEND));
-  if (fd < 0) FailFromErrno(errno);
-  file_.reset(::fdopen(fd, replace ? "w" : "a"));
-  if (file_ == nullptr) {
-    int error = errno;
-    ::close(fd);
-    FailFromErrno(error);
-  }
+  file_.reset(fs::OpenOutputStream(path, replace));
+  if (file_ == nullptr) FailFromErrno(errno);
 }
 
 void LogFile::Close() { file_.reset(); }

@@ -6,7 +6,6 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <cerrno>
 #include <cstring>
 #include <ctime>
@@ -263,13 +262,5 @@ PropertyCache::Counts PropertyCache::Counters() const {
   std::lock_guard lock(impl_->mutex);
   return impl_->counts;
 }
-
-namespace {
-std::atomic<PropertyCache*> cacheInUse{nullptr};
-}  // namespace
-
-void UsePropertyCache(PropertyCache* cache) { cacheInUse.store(cache); }
-
-PropertyCache* PropertyCacheInUse() { return cacheInUse.load(); }
 
 }  // namespace trl

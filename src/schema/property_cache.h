@@ -42,14 +42,16 @@ class PropertyCache {
   PropertyCache(const std::string& path, Warn warn, Options options);
   PropertyCache(const std::string& path, Warn warn);
   // Writes what is pending.
-  ~PropertyCache();
+  virtual ~PropertyCache();
   PropertyCache(const PropertyCache&) = delete;
   PropertyCache& operator=(const PropertyCache&) = delete;
 
   // Property `kind` of the file `reader` has open: the stored value when the file is as it was
   // when the value was stored, else `read(reader)`, stored when the file can be trusted not to
   // have changed unseen. What `read` throws passes through, and nothing is stored then.
-  std::string Value(fs::FileReader& reader, int kind, const Read& read);
+  // Virtual, so that the property readers reach it without linking the database code, which a
+  // host without a cache does not build.
+  virtual std::string Value(fs::FileReader& reader, int kind, const Read& read);
 
   // Writes the pending stores to the database now.
   void Flush();

@@ -1,11 +1,10 @@
-#include <openssl/evp.h>
-
 #include <algorithm>
 #include <array>
 #include <memory>
 
 #include "platform/failure.h"
 #include "platform/fs/long_read.h"
+#include "schema/md5_digest.h"
 #include "schema/pe_version.h"
 #include "schema/property_cache.h"
 #include "schema/schema.h"
@@ -17,11 +16,7 @@ constexpr size_t kDigestChunk = size_t{256} << 10;
 
 // The MD5 digest of everything the reader gives, in lower-case hex.
 std::string Md5Hex(fs::FileReader& reader) {
-  std::unique_ptr<EVP_MD_CTX, decltype(&EVP_MD_CTX_free)> context(EVP_MD_CTX_new(),
-                                                                  &EVP_MD_CTX_free);
-  if (!context || EVP_DigestInit_ex(context.get(), EVP_md5(), nullptr) != 1) {
-    Fail(kInvalidArgument, "MD5 digest unavailable");
-  }
+  Md5Digest md5;
   // One buffer per thread for every file it hashes: a fresh one per file would fault in new pages
   // each time. Never past the size the file had when opened: one that grows meanwhile is not read
   // forever.
@@ -37,19 +32,17 @@ std::string Md5Hex(fs::FileReader& reader) {
     size_t got = reader.ReadAt(
         offset, buffer.get(), static_cast<size_t>(std::min<uint64_t>(kDigestChunk, size - offset)));
     if (got == 0) break;
-    EVP_DigestUpdate(context.get(), buffer.get(), got);
+    md5.Update(buffer.get(), got);
     offset += got;
   }
-  std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};
-  unsigned int length = 0;
-  EVP_DigestFinal_ex(context.get(), digest.data(), &length);
+  std::array<unsigned char, 16> digest = md5.Final();
 
   static constexpr char kHex[] = "0123456789abcdef";
   std::string text;
-  text.reserve(length * 2);
-  for (unsigned int i = 0; i < length; ++i) {
-    text.push_back(kHex[digest[i] >> 4]);
-    text.push_back(kHex[digest[i] & 0xF]);
+  text.reserve(digest.size() * 2);
+  for (unsigned char byte : digest) {
+    text.push_back(kHex[byte >> 4]);
+    text.push_back(kHex[byte & 0xF]);
   }
   return text;
 }

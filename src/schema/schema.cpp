@@ -1,13 +1,12 @@
 #include "schema/schema.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <array>
 #include <limits>
 #include <utility>
 
 #include "platform/failure.h"
+#include "platform/host_name.h"
 #include "platform/text.h"
 #include "schema/application_selection.h"
 
@@ -32,9 +31,7 @@ constexpr std::array<const char*, 4> kFixedLocalNames{"localhost", "127.0.0.1", 
 
 // This machine's host name and its first label, lower-cased; none when it cannot be read.
 std::vector<std::string> HostNames() {
-  std::array<char, 256> buffer{};
-  if (gethostname(buffer.data(), buffer.size() - 1) != 0) return {};
-  std::string host = LowerCase(buffer.data());
+  std::string host = LowerCase(HostName());
   if (host.empty()) return {};
   std::string label = host.substr(0, host.find('.'));
   if (label.empty() || label == host) return {host};

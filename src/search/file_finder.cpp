@@ -1,5 +1,3 @@
-#include <fnmatch.h>
-
 #include <algorithm>
 #include <array>
 #include <utility>
@@ -10,6 +8,7 @@
 #include "platform/clock.h"
 #include "platform/convert.h"
 #include "platform/fs/file_system.h"
+#include "platform/glob_match.h"
 #include "platform/regexp.h"
 #include "platform/text.h"
 #include "schema/schema.h"
@@ -167,8 +166,7 @@ bool Search::Excluded(const std::string& name, const std::string& path) const {
   std::string nativePath = NameToNative(slashed);
   if (nativePath.size() > 1 && nativePath.ends_with('/')) nativePath.pop_back();
   return std::any_of(read_.excluded.begin(), read_.excluded.end(), [&](const std::string& glob) {
-    return fnmatch(glob.c_str(), native.c_str(), 0) == 0 ||
-           fnmatch(glob.c_str(), nativePath.c_str(), FNM_PATHNAME) == 0;
+    return GlobMatches(glob, native, false) || GlobMatches(glob, nativePath, true);
   });
 }
 

@@ -12,7 +12,7 @@
 #include "frame/vocabulary.h"
 #include "platform/clock.h"
 #include "platform/convert.h"
-#include "platform/fs/posix/posix_file_system.h"
+#include "platform/fs/system_file_system.h"
 #include "platform/regexp.h"
 #include "schema/schema.h"
 #include "search/search_names.h"
@@ -40,11 +40,8 @@ xml::Node FirstLocalComputer(xml::Node root) {
 }  // namespace
 
 Search::Search() : Search(nullptr) {
-  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject", [] {
-    fs::ShareTable shares;
-    shares.AddSystemMounts();
-    return fs::CreatePosixFileSystem(std::move(shares));
-  });
+  objFSO = CreateService<fs::FileSystem>("Scripting.FileSystemObject",
+                                         [] { return fs::CreateSystemFileSystem(); });
 }
 
 Search::Search(std::unique_ptr<fs::FileSystem> fileSystem)

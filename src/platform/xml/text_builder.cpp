@@ -1,10 +1,9 @@
 #include "platform/xml/text_builder.h"
 
-#include <sys/mman.h>
-
 #include <algorithm>
 #include <cstring>
-#include <new>
+
+#include "platform/page_blocks.h"
 
 namespace trl::xml {
 
@@ -20,9 +19,7 @@ void TextBuilder::write(const void* data, size_t size) {
   while (size > 0) {
     if (blocks_.empty() || blocks_.back().used == blockSize_) {
       // Mapped, not allocated: the allocator might keep a freed block instead of returning it.
-      void* block =
-          mmap(nullptr, blockSize_, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
-      if (block == MAP_FAILED) throw std::bad_alloc();
+      void* block = MapPages(blockSize_);
       blocks_.push_back({static_cast<char*>(block), 0});
     }
     Block& block = blocks_.back();
@@ -43,7 +40,7 @@ std::string TextBuilder::Take() {
     text.append(start_);
     for (Block& block : blocks_) {
       text.append(block.data, block.used);
-      munmap(block.data, blockSize_);
+      UnmapPages(block.data, blockSize_);
       block.data = nullptr;
     }
   }
@@ -53,7 +50,7 @@ std::string TextBuilder::Take() {
 
 void TextBuilder::Release() {
   for (const Block& block : blocks_) {
-    if (block.data != nullptr) munmap(block.data, blockSize_);
+    if (block.data != nullptr) UnmapPages(block.data, blockSize_);
   }
   blocks_.clear();
   start_ = std::string();
