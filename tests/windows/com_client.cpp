@@ -303,7 +303,9 @@ void CheckTypeLibrary(IDispatch* object, const ClassIdentity& identity) {
     Expect(function->memid == member.id && function->invkind == kind &&
                Narrow(memberName) == member.name &&
                function->oVft == static_cast<SHORT>((7 + member.slot - 1) * sizeof(void*)),
-           what);
+           what + " (found " + Narrow(memberName) + " id " + std::to_string(function->memid) +
+               " kind " + std::to_string(function->invkind) + " offset " +
+               std::to_string(function->oVft) + ")");
     SysFreeString(memberName);
     vtable->ReleaseFuncDesc(function);
 
@@ -466,13 +468,14 @@ int Check(const std::wstring& exampleFolder, const std::wstring& resultsFile) {
                          ObjectByReference(&fingerprint), ObjectByReference(&localFiles)},
                         &ignored)),
          "Search.Start");
+  Expect(localFiles != nullptr,
+         "Search put a document into the results variable it was given without one");
+  IXMLDOMDocument2* localFilesDocument = NewDocument();
+  VARIANT_BOOL loaded = VARIANT_FALSE;
+  localFilesDocument->loadXML(V_BSTR(&ignored), &loaded);
   VariantClear(&ignored);
-  IXMLDOMDocument2* localFilesDocument = nullptr;
-  if (localFiles != nullptr) {
-    localFiles->QueryInterface(IID_IXMLDOMDocument2, reinterpret_cast<void**>(&localFilesDocument));
-  }
-  Expect(localFilesDocument != nullptr && Count(localFilesDocument, L"//f") > 0,
-         "Search gave the caller a platform document of the files it found");
+  Expect(loaded == VARIANT_TRUE && Count(localFilesDocument, L"//f") > 0,
+         "Search gave the files it found");
   VARIANT matchesText;
   IDispatch* files = localFilesDocument;
   Expect(SUCCEEDED(Call(compare, L"Start", DISPATCH_METHOD,
@@ -481,7 +484,6 @@ int Check(const std::wstring& exampleFolder, const std::wstring& resultsFile) {
                         &matchesText)),
          "Compare.Start");
   IXMLDOMDocument2* matches = NewDocument();
-  VARIANT_BOOL loaded = VARIANT_FALSE;
   matches->loadXML(V_BSTR(&matchesText), &loaded);
   VariantClear(&matchesText);
   Expect(loaded == VARIANT_TRUE && Count(matches, L"//a[@v_name]") == 0,
@@ -494,7 +496,7 @@ int Check(const std::wstring& exampleFolder, const std::wstring& resultsFile) {
   Expect(Count(matches, L"//a") > 0 && Count(matches, L"//a[@v_name]") == Count(matches, L"//a"),
          "Filter wrote a verdict on every application of the client's document");
   matches->Release();
-  if (localFilesDocument != nullptr) localFilesDocument->Release();
+  localFilesDocument->Release();
   if (localFiles != nullptr) localFiles->Release();
   for (IDispatch* stage : {search, compare, filter}) stage->Release();
   example.searchOptions->Release();

@@ -6,6 +6,30 @@
 #include "server/windows/com_text.h"
 
 namespace trl::server::windows {
+namespace {
+
+HRESULT Load(IXMLDOMDocument2* client, const std::string& xml) {
+  Bstr text(xml);
+  VARIANT_BOOL loaded = VARIANT_FALSE;
+  HRESULT result = client->loadXML(text.get(), &loaded);
+  if (FAILED(result)) return result;
+  return loaded == VARIANT_TRUE ? S_OK : E_FAIL;
+}
+
+// The platform's document cannot load nothing: a document the run emptied (a lent root element
+// moved to another document) loses its root element instead.
+HRESULT Empty(IXMLDOMDocument2* client) {
+  IXMLDOMElement* root = nullptr;
+  HRESULT result = client->get_documentElement(&root);
+  if (FAILED(result) || root == nullptr) return result;
+  IXMLDOMNode* removed = nullptr;
+  result = client->removeChild(root, &removed);
+  if (removed != nullptr) removed->Release();
+  root->Release();
+  return result;
+}
+
+}  // namespace
 
 ClientDocuments::~ClientDocuments() { Clear(); }
 
@@ -70,13 +94,8 @@ HRESULT ClientDocuments::WriteBack() {
     uint64_t count = lent.document->ModificationCount();
     if (count == lent.written) continue;
     std::string xml = lent.document->Xml();
-    // The platform's document cannot load nothing; no run empties a document it was given.
-    if (xml.empty()) continue;
-    Bstr text(xml);
-    VARIANT_BOOL loaded = VARIANT_FALSE;
-    HRESULT result = lent.client->loadXML(text.get(), &loaded);
+    HRESULT result = xml.empty() ? Empty(lent.client) : Load(lent.client, xml);
     if (FAILED(result)) return result;
-    if (loaded != VARIANT_TRUE) return E_FAIL;
     lent.written = count;
   }
   return S_OK;

@@ -34,10 +34,14 @@ bool SetKey(const std::wstring& key, const std::wstring& value, const wchar_t* n
   return written;
 }
 
+// Removes HKEY_CLASSES_ROOT\key with everything under it; a key that is not there is removed.
 bool DeleteTree(const std::wstring& key) {
-  LSTATUS status = RegDeleteTreeW(HKEY_CLASSES_ROOT, key.c_str());
-  if (status == ERROR_FILE_NOT_FOUND) return true;
-  return status == ERROR_SUCCESS && RegDeleteKeyW(HKEY_CLASSES_ROOT, key.c_str()) == ERROR_SUCCESS;
+  auto gone = [](LSTATUS status) {
+    return status == ERROR_SUCCESS || status == ERROR_FILE_NOT_FOUND;
+  };
+  // The tree's deletion takes the key itself on some systems and leaves it on others.
+  return gone(RegDeleteTreeW(HKEY_CLASSES_ROOT, key.c_str())) &&
+         gone(RegDeleteKeyW(HKEY_CLASSES_ROOT, key.c_str()));
 }
 
 std::wstring Text(const TrlGuid& guid) { return Wide(GuidText(guid)); }
@@ -50,6 +54,14 @@ HRESULT RegisterTypeLibraryAt(const std::wstring& path) {
   result = RegisterTypeLib(library, registered.data(), nullptr);
   library->Release();
   return result;
+}
+
+// Unregistration may be run twice: a type library that is not registered is left as it is.
+bool UnregisterTypeLibrary(const GUID& id, WORD major, WORD minor, LCID locale) {
+  BSTR path = nullptr;
+  if (FAILED(QueryPathOfRegTypeLib(id, major, minor, locale, &path))) return true;
+  SysFreeString(path);
+  return SUCCEEDED(UnRegisterTypeLib(id, major, minor, locale, SYS_WIN64));
 }
 
 }  // namespace
@@ -84,13 +96,11 @@ HRESULT Unregister() {
   }
   if (!removed) return SELFREG_E_CLASS;
   const TypeLibrary& library = ComponentTypeLibrary();
-  HRESULT own = UnRegisterTypeLib(ToGuid(library.id), library.majorVersion, library.minorVersion,
-                                  library.lcid, SYS_WIN64);
-  HRESULT schema =
-      UnRegisterTypeLib(ToGuid(Foreign().schemaTypeLibrary), 1, 0, library.lcid, SYS_WIN64);
-  // Removing what is not there is no failure: unregistration may be run twice.
-  auto gone = [](HRESULT result) { return SUCCEEDED(result) || result == TYPE_E_REGISTRYACCESS; };
-  return gone(own) && gone(schema) ? S_OK : SELFREG_E_TYPELIB;
+  return UnregisterTypeLibrary(ToGuid(library.id), library.majorVersion, library.minorVersion,
+                               library.lcid) &&
+                 UnregisterTypeLibrary(ToGuid(Foreign().schemaTypeLibrary), 1, 0, library.lcid)
+             ? S_OK
+             : SELFREG_E_TYPELIB;
 }
 
 }  // namespace trl::server::windows
