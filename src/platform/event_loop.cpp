@@ -137,14 +137,14 @@ void EventLoop::Yield() {
     if (timer == nullptr) continue;
     timer->id_ = state.Add(timer, now + std::chrono::milliseconds(timer->interval_));
     auto tick = timer->tick_;  // a copy: the handler may destroy its timer
-    if (tick) tick();
+    if (tick) RunDispatched(tick);
   }
 
   // Calls are taken off the queue before they run, so a nested pass never runs one twice.
   while (!state.posted.empty() && state.posted.front().sequence <= lastCall) {
     auto call = std::move(state.posted.front().run);
     state.posted.pop_front();
-    call();
+    RunDispatched(call);
   }
 }
 

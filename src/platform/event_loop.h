@@ -69,4 +69,13 @@ class EventLoop {
 // Yield() of the current thread's loop: lets pending calls and ticks run, then returns.
 void Yield();
 
+// What every tick and posted call of every loop runs inside, set once by a host that must know
+// when the component's code runs: a server whose client pumps the loop itself (the thread's
+// message queue on Windows) defers the destruction of objects its client lets go of inside an
+// event until the tick that raised it has returned. None by default.
+using DispatchScope = std::function<void(const std::function<void()>& run)>;
+void SetDispatchScope(DispatchScope scope);
+// Runs `run` inside the scope, if one is set.
+void RunDispatched(const std::function<void()>& run);
+
 }  // namespace trl

@@ -450,6 +450,21 @@ int Check(const std::wstring& exampleFolder, const std::wstring& resultsFile) {
   (void)cookie;
   locate->Release();
 
+  // Let go of from inside its own event, in the middle of a run: the client goes on.
+  IDispatch* dropped = Create("trlLocator.Locate");
+  Sink dropping;
+  Advise(dropped, trl::server::FindClass("trlLocator.Locate")->eventInterfaceId, dropping);
+  dropping.onProgress = [&] {
+    if (dropped != nullptr) {
+      dropped->Release();
+      dropped = nullptr;
+    }
+  };
+  Call(dropped, L"Start", DISPATCH_METHOD, LocateArguments(example), &empty);
+  VariantClear(&empty);
+  PumpUntil([] { return false; }, std::chrono::seconds(2));
+  Expect(dropped == nullptr, "the object let go of inside its event was running");
+
   // The stages change the client's documents in place: Search fills the results variable it was
   // given empty, and Filter writes its verdicts into the client's matches.
   IDispatch* search = Create("trlLocator.Search");

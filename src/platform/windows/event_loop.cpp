@@ -95,7 +95,7 @@ struct EventLoop::State {
     auto found = timers.find(id);
     if (found == timers.end()) return;
     auto tick = found->second->tick_;  // a copy: the handler may destroy its timer
-    if (tick) tick();
+    if (tick) RunDispatched(tick);
   }
 
   // Runs the calls posted before this moment; those they post wait for their own message.
@@ -106,7 +106,7 @@ struct EventLoop::State {
     while (!posted.empty() && posted.front().sequence <= lastCall) {
       auto call = std::move(posted.front().run);
       posted.pop_front();
-      call();
+      RunDispatched(call);
     }
   }
 
