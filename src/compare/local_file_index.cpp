@@ -86,8 +86,12 @@ void LocalFileIndex::Reserve(size_t files) {
 
 void LocalFileIndex::AddDrive(std::string machine, std::string encodedMachine, bool localMachine,
                               std::string drive, std::string encodedDrive) {
-  drives_.push_back({std::move(machine), std::move(encodedMachine), localMachine, std::move(drive),
-                     std::move(encodedDrive)});
+  drives_.push_back({std::move(machine),
+                     std::move(encodedMachine),
+                     localMachine,
+                     std::move(drive),
+                     std::move(encodedDrive),
+                     {}});
 }
 
 void LocalFileIndex::AddLink(std::string link, std::string target) {
