@@ -58,6 +58,8 @@ class TRL_API Node {
   size_t CountNodes(std::string_view xpath) const;
   // The descendant elements with this tag ("*" for all), in document order.
   std::vector<Node> GetElementsByTagName(std::string_view tag) const;
+  // How many of them there are, without listing them.
+  size_t CountElementsByTagName(std::string_view tag) const;
 
   // Tree changes. A node of this document moves (handles to it stay valid); a node of another
   // document is copied here and removed from its own document: use the returned handle.

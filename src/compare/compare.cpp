@@ -93,7 +93,7 @@ void Compare::Match() {
     e_a_total = ToInt32(static_cast<double>(applications.size()));
   });
   size_t files = 0;
-  on([&] { files = EveryElement(*objLocalFilesDOM, vocab::f).size(); });
+  on([&] { files = CountEveryElement(*objLocalFilesDOM, vocab::f); });
   if (files != 0) {
     BeginRun(on);
     FillRecordset(files);

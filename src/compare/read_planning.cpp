@@ -48,7 +48,7 @@ void Compare::StartReadAheadEarly() {
   auto index = std::make_unique<LocalFileIndex>();
   try {
     applications = EveryElement(*objFingerprintDOM, vocab::a);
-    size_t files = EveryElement(*objLocalFilesDOM, vocab::f).size();
+    size_t files = CountEveryElement(*objLocalFilesDOM, vocab::f);
     if (files == 0) return;
     index->Reserve(files);
     if (!TryFillLocalFileIndex(*objLocalFilesDOM, *index)) return;

@@ -47,7 +47,7 @@ std::string Filter::Start(int16_t intFilterOptions, xml::DocumentPtr matches) {
 void Filter::RunBody() {
   OnError on{kClass, kFilterLabel};
   on([&] {
-    e_match_total = ToInt32(static_cast<double>(EveryElement(Use(objMatchesDOM), vocab::a).size()));
+    e_match_total = ToInt32(static_cast<double>(CountEveryElement(Use(objMatchesDOM), vocab::a)));
   });
   BeginRun(on);
   WalkApplications();

@@ -16,6 +16,12 @@ inline std::vector<xml::Node> EveryElement(xml::Document& document, std::string_
   return document.AsNode().GetElementsByTagName(tag);
 }
 
+// How many EveryElement would list.
+inline size_t CountEveryElement(xml::Document& document, std::string_view tag) {
+  if (!document.DocumentElement()) Fail(kObjectNotSet);
+  return document.AsNode().CountElementsByTagName(tag);
+}
+
 // Hands each of `elements` (every `tag` element, as EveryElement lists them) to `visit`, which
 // answers whether to go on, for walks that change the document as they go: one that a visit
 // destroyed, with the version it stood in or the application moved away, is passed over, where

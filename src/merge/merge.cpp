@@ -88,11 +88,11 @@ void Merge::CountApplications() {
   e_match_total_new = e_match_total_old = e_match_merged = e_match_missing = 0;
   on([&] {
     e_match_total_new =
-        ToInt32(static_cast<double>(EveryElement(*objNewResultsDOM, vocab::a).size()));
+        ToInt32(static_cast<double>(CountEveryElement(*objNewResultsDOM, vocab::a)));
   });
   on([&] {
     e_match_total_old =
-        ToInt32(static_cast<double>(EveryElement(*objOldResultsDOM, vocab::a).size()));
+        ToInt32(static_cast<double>(CountEveryElement(*objOldResultsDOM, vocab::a)));
   });
 }
 
@@ -226,7 +226,7 @@ bool Merge::BeginSequence(xml::DocumentPtr applicationOptions, xml::DocumentPtr 
   e_match_total_new = e_match_merged = e_match_missing = 0;
   on([&] {
     e_match_total_old =
-        ToInt32(static_cast<double>(EveryElement(*objOldResultsDOM, vocab::a).size()));
+        ToInt32(static_cast<double>(CountEveryElement(*objOldResultsDOM, vocab::a)));
   });
   return true;
 }
@@ -257,7 +257,7 @@ void Merge::MergeNext(xml::DocumentPtr searchOptions, xml::DocumentPtr newResult
   on([&] {
     e_match_total_new =
         CheckedAdd(e_match_total_new,
-                   ToInt32(static_cast<double>(EveryElement(*objNewResultsDOM, vocab::a).size())));
+                   ToInt32(static_cast<double>(CountEveryElement(*objNewResultsDOM, vocab::a))));
   });
   MergeResults();
   objNewResultsDOM.reset();

@@ -36,6 +36,23 @@ std::vector<Node> Select(Document::Impl& impl, pugi::xml_node context, std::stri
   return nodes;
 }
 
+// Hands `found` each `tag` element below `node` in document order, by a walk of the subtree that
+// the document's index of descendants takes note of.
+template <class Found>
+void ForEachElementBelow(Document::Impl& impl, pugi::xml_node node, std::string_view tag,
+                         Found found) {
+  size_t visited = 0;
+  // The holder is the document's last child, so meeting it ends the tree.
+  for (pugi::xml_node at = NextInSubtree(node, node); at && at != impl.holder;
+       at = NextInSubtree(at, node)) {
+    ++visited;
+    if (at.type() == pugi::node_element && (tag == "*" || TerminatedEquals(at.name(), tag))) {
+      found(at);
+    }
+  }
+  impl.descendants.Walked(node, visited, impl.doc, impl.holder);
+}
+
 }  // namespace
 
 std::vector<Node> Node::SelectNodes(std::string_view xpath) const {
@@ -63,17 +80,17 @@ std::vector<Node> Node::GetElementsByTagName(std::string_view tag) const {
     for (uint32_t position : *below) found.push_back(impl.Wrap(impl.descendants.At(position)));
     return found;
   }
-  size_t visited = 0;
-  // The holder is the document's last child, so meeting it ends the tree.
-  for (pugi::xml_node at = NextInSubtree(node, node); at && at != impl.holder;
-       at = NextInSubtree(at, node)) {
-    ++visited;
-    if (at.type() == pugi::node_element && (tag == "*" || TerminatedEquals(at.name(), tag))) {
-      found.push_back(impl.Wrap(at));
-    }
-  }
-  impl.descendants.Walked(node, visited, impl.doc, impl.holder);
+  ForEachElementBelow(impl, node, tag, [&](pugi::xml_node at) { found.push_back(impl.Wrap(at)); });
   return found;
+}
+
+size_t Node::CountElementsByTagName(std::string_view tag) const {
+  pugi::xml_node node = Require(*this);
+  Document::Impl& impl = *document_->impl_;
+  if (auto below = impl.descendants.Below(node, tag)) return below->size();
+  size_t count = 0;
+  ForEachElementBelow(impl, node, tag, [&](pugi::xml_node) { ++count; });
+  return count;
 }
 
 }  // namespace trl::xml

@@ -289,6 +289,7 @@ TEST(XmlDocumentTest, DetachedNodesStayOutOfSight) {
   EXPECT_EQ(Labels(doc.AsNode().SelectNodes("//c")), Strings{"c=1"});
   EXPECT_EQ(root.GetElementsByTagName("*").size(), 2u);
   EXPECT_EQ(doc.AsNode().GetElementsByTagName("m").size(), 1u);
+  EXPECT_EQ(doc.AsNode().CountElementsByTagName("*"), 3u);
   EXPECT_EQ(doc.AsNode().ChildNodes(), std::vector<Node>{root});
   EXPECT_EQ(doc.AsNode().Text() + doc.Xml(), "t<r><c id=\"1\">t<m/></c></r>");
   std::string pieces;
@@ -350,10 +351,9 @@ TEST(XmlDocumentTest, FindsElementsBelowEachLevelOfADeepChain) {
   auto expect = [&](const std::vector<Node>& top, const std::vector<Node>& upper,
                     const std::vector<Node>& lower) {
     for (int level = 0; level < kDepth; ++level) {
-      ASSERT_EQ(chain[level].GetElementsByTagName("y"), level == 0            ? top
-                                                        : level <= kDepth / 2 ? upper
-                                                                              : lower)
-          << level;
+      const std::vector<Node>& below = level == 0 ? top : level <= kDepth / 2 ? upper : lower;
+      ASSERT_EQ(chain[level].GetElementsByTagName("y"), below) << level;
+      ASSERT_EQ(chain[level].CountElementsByTagName("y"), below.size()) << level;
     }
   };
   expect({middle, bottom, last}, {middle, bottom}, {bottom});
