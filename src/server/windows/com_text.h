@@ -9,10 +9,8 @@
 
 namespace trl::server::windows {
 
-// UTF-8, the component's text, from the platform's UTF-16 strings and back.
-std::string Utf8(const wchar_t* text, size_t length);
-std::string Utf8(BSTR text);  // a null string is ""
-std::wstring Wide(std::string_view text);
+// UTF-8, the component's text, from the platform's string; a null string is "".
+std::string Utf8(BSTR text);
 // A new string for the client; throws bad_alloc when there is no memory for it.
 BSTR NewBstr(std::string_view text);
 

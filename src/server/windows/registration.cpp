@@ -5,9 +5,9 @@
 
 #include <string>
 
+#include "platform/windows/wide_text.h"
 #include "server/guid.h"
 #include "server/identities.h"
-#include "server/windows/com_text.h"
 #include "server/windows/server_object.h"
 #include "server/windows/type_library.h"
 
@@ -44,7 +44,7 @@ bool DeleteTree(const std::wstring& key) {
          gone(RegDeleteKeyW(HKEY_CLASSES_ROOT, key.c_str()));
 }
 
-std::wstring Text(const TrlGuid& guid) { return Wide(GuidText(guid)); }
+std::wstring Text(const TrlGuid& guid) { return ToWide(GuidText(guid)); }
 
 HRESULT RegisterTypeLibraryAt(const std::wstring& path) {
   ITypeLib* library = nullptr;
@@ -70,7 +70,7 @@ HRESULT Register() {
   const std::wstring path = ModulePath();
   const TypeLibrary& library = ComponentTypeLibrary();
   for (const ClassIdentity& identity : Classes()) {
-    std::wstring progId = Wide(identity.progId);
+    std::wstring progId = ToWide(identity.progId);
     std::wstring classKey = L"CLSID\\" + Text(identity.classId);
     bool written = SetKey(classKey, progId) &&
                    SetKey(classKey + L"\\InprocServer32", path, L"ThreadingModel", L"Apartment") &&
@@ -92,7 +92,7 @@ HRESULT Unregister() {
   bool removed = true;
   for (const ClassIdentity& identity : Classes()) {
     removed = DeleteTree(L"CLSID\\" + Text(identity.classId)) && removed;
-    removed = DeleteTree(Wide(identity.progId)) && removed;
+    removed = DeleteTree(ToWide(identity.progId)) && removed;
   }
   if (!removed) return SELFREG_E_CLASS;
   const TypeLibrary& library = ComponentTypeLibrary();
