@@ -1,8 +1,9 @@
 #include "platform/fs/output_stream.h"
 
+#include <windows.h>
+
 #include <fcntl.h>
 #include <io.h>
-#include <windows.h>
 
 #include <cerrno>
 

@@ -1,7 +1,8 @@
 #include "platform/xml/file_bytes.h"
 
-#include <fmt/format.h>
 #include <windows.h>
+
+#include <fmt/format.h>
 
 #include <algorithm>
 #include <cstdint>
