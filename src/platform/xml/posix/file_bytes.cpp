@@ -24,21 +24,16 @@ std::optional<ParseError> ReadFileBytes(const std::string& path, size_t limit, s
   if (::fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
     expected = static_cast<size_t>(status.st_size) + 1;  // the end is seen without another read
   }
-  // One byte past the limit, to see that it was passed (unless there is none).
-  const size_t most = std::max(limit, limit + 1);
-  bytes.resize(std::min(expected, most));
-  size_t used = 0;
-  for (;;) {
-    if (used == bytes.size()) bytes.resize(std::min(bytes.size() * 2, most));
-    ssize_t got = ::read(descriptor, bytes.data() + used, bytes.size() - used);
-    if (got < 0 && errno == EINTR) continue;
-    if (got < 0) return Unreadable(std::strerror(errno));
-    if (got == 0) break;
-    used += static_cast<size_t>(got);
-    if (used > limit) return TooLarge(limit);
-  }
-  bytes.resize(used);
-  return std::nullopt;
+  return ReadUpToLimit(expected, limit, bytes,
+                       [&](char* into, size_t room, size_t& got) -> std::optional<ParseError> {
+                         ssize_t read = 0;
+                         do {
+                           read = ::read(descriptor, into, room);
+                         } while (read < 0 && errno == EINTR);
+                         if (read < 0) return Unreadable(std::strerror(errno));
+                         got = static_cast<size_t>(read);
+                         return std::nullopt;
+                       });
 }
 
 std::optional<std::string> ConvertToUtf8(std::string_view bytes, const std::string& encoding,

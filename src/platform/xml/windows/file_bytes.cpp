@@ -138,25 +138,18 @@ std::optional<ParseError> ReadFileBytes(const std::string& path, size_t limit, s
   if (GetFileType(file) == FILE_TYPE_DISK && GetFileSizeEx(file, &fileSize)) {
     expected = static_cast<size_t>(fileSize.QuadPart) + 1;  // the end is seen without another read
   }
-  // One byte past the limit, to see that it was passed (unless there is none).
-  const size_t most = std::max(limit, limit + 1);
-  bytes.resize(std::min(expected, most));
-  size_t used = 0;
-  for (;;) {
-    if (used == bytes.size()) bytes.resize(std::min(bytes.size() * 2, most));
-    DWORD want = static_cast<DWORD>(std::min<size_t>(bytes.size() - used, DWORD{1} << 30));
-    DWORD got = 0;
-    if (!ReadFile(file, bytes.data() + used, want, &got, nullptr)) {
-      DWORD error = GetLastError();
-      if (error == ERROR_BROKEN_PIPE) break;  // the writer closed its end
-      return Unreadable(SystemMessage(error));
-    }
-    if (got == 0) break;
-    used += got;
-    if (used > limit) return TooLarge(limit);
-  }
-  bytes.resize(used);
-  return std::nullopt;
+  return ReadUpToLimit(expected, limit, bytes,
+                       [&](char* into, size_t room, size_t& got) -> std::optional<ParseError> {
+                         DWORD want = static_cast<DWORD>(std::min<size_t>(room, DWORD{1} << 30));
+                         DWORD read = 0;
+                         if (!ReadFile(file, into, want, &read, nullptr)) {
+                           DWORD error = GetLastError();
+                           // The writer of a pipe closed its end: the end of the text.
+                           if (error != ERROR_BROKEN_PIPE) return Unreadable(SystemMessage(error));
+                         }
+                         got = read;
+                         return std::nullopt;
+                       });
 }
 
 std::optional<std::string> ConvertToUtf8(std::string_view bytes, const std::string& encoding,
