@@ -69,44 +69,63 @@ size_t MissingCount(xml::Document& document) {
 
 // What the fingerprint tells of the versions: their names, for naming best guesses, and the
 // types of each file's properties by the bit of its weight, for telling which kinds of evidence
-// agreed.
+// agreed. The files of a version are looked at only when a finding asks for them: a fingerprint
+// holds many more versions than one inventory decides.
 class VersionNames {
  public:
   explicit VersionNames(xml::Document& fingerprint) {
     for (xml::Node a : fingerprint.AsNode().GetElementsByTagName(vocab::a)) {
       std::string application = AttributeText(a, vocab::a_id);
       for (xml::Node v : a.ChildElements(vocab::v)) {
-        std::string version = application + "\n" + AttributeText(v, vocab::v_id);
-        names_.emplace(version, AttributeText(v, vocab::v_name));
-        for (xml::Node f : v.ChildElements(vocab::f)) {
-          auto& types = types_[version + "\n" + AttributeText(f, vocab::f_id)];
-          for (xml::Node p : f.ChildElements(vocab::p)) {
-            int64_t weight = AttributeNumber(p, vocab::p_weight),
-                    type = AttributeNumber(p, vocab::p_type);
-            if (weight >= 1 && weight <= 15 && type >= 1 && type <= 4) {
-              types.emplace_back(unsigned{1} << (weight - 1), unsigned{1} << (type - 1));
-            }
-          }
-        }
+        Version& version = versions_[application + "\n" + AttributeText(v, vocab::v_id)];
+        if (version.elements.empty()) version.name = AttributeText(v, vocab::v_name);
+        version.elements.push_back(v);
       }
     }
   }
   std::string Of(const std::string& application, const std::string& version) const {
-    auto found = names_.find(application + "\n" + version);
-    return found != names_.end() ? found->second : "version id " + version;
+    auto found = versions_.find(application + "\n" + version);
+    return found != versions_.end() ? found->second.name : "version id " + version;
   }
-  // The property types (bit 1 for type 1, up to bit 8 for type 4) whose weight bits `mask` holds.
-  unsigned TypesAgreed(const std::string& file, unsigned mask) const {
-    auto found = types_.find(file);
+  // The property types (bit 1 for type 1, up to bit 8 for type 4) whose weight bits `mask` holds,
+  // of the file `file` of the version: every version element of that id tells its part.
+  unsigned TypesAgreed(const std::string& version, const std::string& file, unsigned mask) {
+    auto found = versions_.find(version);
+    if (found == versions_.end()) return 0;
+    Version& known = found->second;
+    if (!known.filesRead) ReadFiles(known);
+    auto types = known.types.find(file);
     unsigned agreed = 0;
-    if (found == types_.end()) return agreed;
-    for (const auto& [bit, type] : found->second) agreed |= (mask & bit) != 0 ? type : 0;
+    if (types == known.types.end()) return agreed;
+    for (const auto& [bit, type] : types->second) agreed |= (mask & bit) != 0 ? type : 0;
     return agreed;
   }
 
  private:
-  std::unordered_map<std::string, std::string> names_;
-  std::unordered_map<std::string, std::vector<std::pair<unsigned, unsigned>>> types_;
+  struct Version {
+    std::string name;  // of the first element with the id
+    std::vector<xml::Node> elements;
+    bool filesRead = false;
+    std::unordered_map<std::string, std::vector<std::pair<unsigned, unsigned>>> types;  // by f_id
+  };
+
+  static void ReadFiles(Version& version) {
+    for (xml::Node v : version.elements) {
+      for (xml::Node f : v.ChildElements(vocab::f)) {
+        auto& types = version.types[AttributeText(f, vocab::f_id)];
+        for (xml::Node p : f.ChildElements(vocab::p)) {
+          int64_t weight = AttributeNumber(p, vocab::p_weight),
+                  type = AttributeNumber(p, vocab::p_type);
+          if (weight >= 1 && weight <= 15 && type >= 1 && type <= 4) {
+            types.emplace_back(unsigned{1} << (weight - 1), unsigned{1} << (type - 1));
+          }
+        }
+      }
+    }
+    version.filesRead = true;
+  }
+
+  std::unordered_map<std::string, Version> versions_;  // by a_id, "\n", v_id
 };
 
 std::string VersionText(const xml::Node& a, const VersionNames& names) {
@@ -124,7 +143,7 @@ std::string VersionText(const xml::Node& a, const VersionNames& names) {
 
 // Fills the parts of `finding` that `a` (an application of the merged user data) tells: the
 // verdict, the version or best guess, and the score of the version that decided it.
-void Describe(const xml::Node& a, const VersionNames& names, Finding& finding) {
+void Describe(const xml::Node& a, VersionNames& names, Finding& finding) {
   finding.managed = AttributeText(a, vocab::a_manage) == "1";
   std::string id = AttributeText(a, vocab::v_id);
   // As the filter wrote them: "-1" with "Multiple Matches" or "Unsupported Version" when several
@@ -163,10 +182,10 @@ void Describe(const xml::Node& a, const VersionNames& names, Finding& finding) {
   // A relabelled version keeps its own id as its guess.
   std::string versionId = AttributeText(decided, vocab::v_id);
   if (versionId == kUnidentifiedVersion) versionId = AttributeText(decided, vocab::v_guess);
-  std::string version = AttributeText(a, vocab::a_id) + "\n" + versionId + "\n";
+  std::string version = AttributeText(a, vocab::a_id) + "\n" + versionId;
   for (xml::Node f : decided.ChildElements(vocab::f)) {
     finding.propertiesMatched |=
-        names.TypesAgreed(version + AttributeText(f, vocab::f_id),
+        names.TypesAgreed(version, AttributeText(f, vocab::f_id),
                           static_cast<unsigned>(AttributeNumber(f, vocab::p_act)));
   }
 }
