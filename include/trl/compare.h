@@ -109,6 +109,11 @@ class TRL_API Compare : public Worker {
 
   // `files`: how many f the local files hold, at most what the index gets.
   void FillRecordset(size_t files);
+  // Has `index` keep only the files named as the fingerprint's files are (the match asks for no
+  // other name) when the local files, `files` of them, far outnumber those.
+  void KeepOnlyAskedNames(LocalFileIndex& index, size_t files) const;
+  // Makes the index anew with every file, for a name it was not made for.
+  void IndexEveryFile();
   // Starts reading ahead the candidates of `applications`, planned as the match will test them.
   void StartReadAhead(const std::vector<xml::Node>& applications);
   // The same before the fingerprint is prepared, when the local-file index builds without a
@@ -193,7 +198,8 @@ class TRL_API Compare : public Worker {
   std::unordered_map<std::string, std::unique_ptr<LocalFileFacts>> filesSeen_;
 
   unsigned readThreads_;
-  bool indexBuiltEarly_ = false;  // rsLocalFiles was filled in Start, without a report
+  bool indexBuiltEarly_ = false;    // rsLocalFiles was filled in Start, without a report
+  uint64_t localFilesChanges_ = 0;  // the local files' modification count then
   struct TRL_LOCAL ReadPlan;
   std::unique_ptr<ReadPlan> readPlan_;
   // Reads files of filesSeen_, so it goes first.

@@ -79,6 +79,13 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
 }
 
 void Compare::RunBody() {
+  if (indexBuiltEarly_ && objLocalFilesDOM->ModificationCount() != localFilesChanges_) {
+    // The client changed the local files after Start: what was made of them then goes.
+    StopReadAhead();
+    filesSeen_.clear();
+    rsLocalFiles.reset();
+    indexBuiltEarly_ = false;
+  }
   // Each run sees the disk as it is now, not as an earlier run of this instance found it (one
   // that began to read ahead in Start looked at it then).
   if (objFSO && !indexBuiltEarly_) objFSO->Forget();
@@ -237,7 +244,11 @@ bool Compare::MatchVersion(xml::Node v) {
     });
     on([&] { key = Use(objSchema).EncodeName(name); });
     LocalFileIndex::Matches candidates;
-    on([&] { candidates = Use(rsLocalFiles).Find(key); });
+    on([&] {
+      // A name the index was not made for: the fingerprint changed during the run.
+      if (rsLocalFiles && !rsLocalFiles->Covers(key)) IndexEveryFile();
+      candidates = Use(rsLocalFiles).Find(key);
+    });
     records.clear();
     for (LocalFileRecord record : candidates) records.push_back(record);
     std::optional<FingerprintFile> file;

@@ -75,7 +75,35 @@ LocalFileIndex::Matches::Iterator& LocalFileIndex::Matches::Iterator::operator++
   return *this;
 }
 
+void LocalFileIndex::KeepOnly(const std::vector<std::string>& keys) {
+  // About 32 bits a key: one name in a few hundred that no fingerprint knows is kept.
+  size_t bits = 1024;
+  while (bits < 32 * keys.size()) bits *= 2;
+  filter_.assign(bits / 64, 0);
+  filterKeys_ = keys.size();
+  std::string lowered;
+  for (const std::string& key : keys) {
+    uint64_t hash = Hash(IndexKey(key, lowered));
+    for (uint64_t bit : {hash & (bits - 1), (hash >> 32) & (bits - 1)}) {
+      filter_[bit / 64] |= uint64_t{1} << (bit % 64);
+    }
+  }
+}
+
+bool LocalFileIndex::FilterHolds(uint64_t hash) const {
+  uint64_t mask = filter_.size() * 64 - 1;
+  auto held = [&](uint64_t bit) { return (filter_[(bit & mask) / 64] >> (bit % 64) & 1) != 0; };
+  return held(hash) && held(hash >> 32);
+}
+
+bool LocalFileIndex::Covers(std::string_view key) const {
+  if (filter_.empty()) return true;
+  std::string lowered;
+  return FilterHolds(Hash(IndexKey(key, lowered)));
+}
+
 void LocalFileIndex::Reserve(size_t files) {
+  if (!filter_.empty()) files = std::min(files, filterKeys_);
   records_.reserve(files);
   // Room for every file to have a name of its own: regrowing a table of millions of keys costs
   // more than the slots it would save.
@@ -111,20 +139,27 @@ const std::vector<FolderAlias>& LocalFileIndex::AliasesOf(const LocalFileRecord&
 
 void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, size_t caseExactFrom) {
   if (drives_.empty()) AddDrive("", "", false, "", "");
-  folders_.push_back({std::move(folder), std::move(exactFolder),
-                      static_cast<uint32_t>(drives_.size() - 1), caseExactFrom});
+  // Listed only once a file in it is kept: most folders hold none when names are filtered.
+  pendingFolder_ = FolderEntry{std::move(folder), std::move(exactFolder),
+                               static_cast<uint32_t>(drives_.size() - 1), caseExactFrom};
 }
 
 void LocalFileIndex::AddFile(std::string_view filename, std::string_view encodedFilename) {
-  if (folders_.empty()) AddFolder("", "");
   std::string lowered;
-  std::string_view key = Schema::FoldedName(Key(encodedFilename, lowered));
+  std::string_view key = IndexKey(encodedFilename, lowered);
+  uint64_t hash64 = Hash(key);
+  if (!filter_.empty() && !FilterHolds(hash64)) return;
+  if (folders_.empty() && !pendingFolder_) AddFolder("", "");
+  if (pendingFolder_) {
+    folders_.push_back(std::move(*pendingFolder_));
+    pendingFolder_.reset();
+  }
   if (records_.size() >= kNone - 1) Fail(kOutOfMemory);
   if (2 * (keys_ + 1) > slots_.size()) Grow();
   // Room first, so that a failing allocation leaves no chain pointing past the records.
   if (records_.size() == records_.capacity()) records_.reserve(records_.size() * 2 + 64);
   auto record = static_cast<uint32_t>(records_.size());
-  uint32_t hash = Hash(key);
+  auto hash = static_cast<uint32_t>(hash64);
   Slot& slot = slots_[Probe(key, hash)];
   bool newKey = slot.first == kNone;
   // A key's text is kept once, with its slot; a name that equals it shares it.
@@ -143,13 +178,15 @@ void LocalFileIndex::AddFile(std::string_view filename, std::string_view encoded
 LocalFileIndex::Matches LocalFileIndex::Find(std::string_view key) const {
   if (slots_.empty()) return {};
   std::string lowered;
-  std::string_view lookup = Schema::FoldedName(Key(key, lowered));
-  return {this, slots_[Probe(lookup, Hash(lookup))].first};
+  std::string_view lookup = IndexKey(key, lowered);
+  return {this, slots_[Probe(lookup, static_cast<uint32_t>(Hash(lookup)))].first};
 }
 
-uint32_t LocalFileIndex::Hash(std::string_view key) {
-  return static_cast<uint32_t>(std::hash<std::string_view>{}(key));
+std::string_view LocalFileIndex::IndexKey(std::string_view name, std::string& lowered) {
+  return Schema::FoldedName(Key(name, lowered));
 }
+
+uint64_t LocalFileIndex::Hash(std::string_view key) { return std::hash<std::string_view>{}(key); }
 
 std::string_view LocalFileIndex::NameAt(uint32_t offset) const { return {names_.data() + offset}; }
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -78,7 +79,14 @@ class LocalFileIndex {
     uint32_t first_ = kNone;
   };
 
-  // Room for `files` records and as many names, made at once.
+  // Keeps only the files whose encoded name may be one of `keys` (as Find is given them): a run
+  // that asks for no other name needs no record of the rest, and most files on a disk have names
+  // no fingerprint knows. Given before the first file.
+  void KeepOnly(const std::vector<std::string>& keys);
+  // Whether Find answers for `key` as it would without KeepOnly.
+  bool Covers(std::string_view key) const;
+
+  // Room for `files` records and as many names, made at once (with KeepOnly, for the names kept).
   void Reserve(size_t files);
 
   // The computer and drive of the records added next.
@@ -134,7 +142,12 @@ class LocalFileIndex {
     uint32_t key;
   };
 
-  static uint32_t Hash(std::string_view key);
+  // The name as the index keys it: lower-cased (into `lowered` when it must be), the exact form
+  // of a name with a case sibling folded.
+  static std::string_view IndexKey(std::string_view name, std::string& lowered);
+  static uint64_t Hash(std::string_view key);
+  // Two bits of the name filter per key, from its hash.
+  bool FilterHolds(uint64_t hash) const;
   std::string_view NameAt(uint32_t offset) const;
   // The slot holding `key`, or the empty slot where it would go.
   size_t Probe(std::string_view key, uint32_t hash) const;
@@ -147,6 +160,11 @@ class LocalFileIndex {
   std::vector<Record> records_;
   std::string names_;
   std::vector<Slot> slots_;  // a power of two in size, at most half full
+  // The folder added last, until a file kept is in it.
+  std::optional<FolderEntry> pendingFolder_;
+  // Bits of the hashes of the keys kept (KeepOnly), a power of two of them; empty: every file.
+  std::vector<uint64_t> filter_;
+  size_t filterKeys_ = 0;
   mutable std::unordered_map<uint32_t, std::vector<FolderAlias>> aliases_;  // by folder
   size_t keys_ = 0;
 };

@@ -9,6 +9,7 @@
 #include "compare/local_file_index.h"
 #include "frame/attributes.h"
 #include "frame/error_handler.h"
+#include "frame/every_element.h"
 #include "frame/use_object.h"
 #include "frame/vocabulary.h"
 #include "platform/convert.h"
@@ -84,6 +85,40 @@ bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
   return true;
 }
 
+void RefillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
+  Fill(localFiles, &index, [](auto&& step) {
+    try {
+      step();
+    } catch (...) {
+      return false;
+    }
+    return true;
+  });
+}
+
+void Compare::KeepOnlyAskedNames(LocalFileIndex& index, size_t files) const {
+  std::vector<std::string> keys{""};  // what a version whose first name cannot be read asks for
+  try {
+    // Worth it only where most local files have names no fingerprint file has.
+    if (files < 4 * CountEveryElement(*objFingerprintDOM, vocab::f)) return;
+    for (const xml::Node& f : EveryElement(*objFingerprintDOM, vocab::f)) {
+      if (auto name = f.GetAttribute(vocab::f_name)) {
+        keys.push_back(objSchema->EncodeName(LowerCase(*name)));
+      }
+    }
+  } catch (...) {
+    return;  // every file, as without a filter
+  }
+  index.KeepOnly(keys);
+}
+
+void Compare::IndexEveryFile() {
+  StopReadAhead();  // its plans hold records of the index replaced
+  auto index = std::make_unique<LocalFileIndex>();
+  RefillLocalFileIndex(*objLocalFilesDOM, *index);
+  rsLocalFiles = std::move(index);
+}
+
 void Compare::FillRecordset(size_t files) {
   if (indexBuiltEarly_) return;
   OnError on{kClass, compare::kFillRecordsetLabel};
@@ -91,6 +126,7 @@ void Compare::FillRecordset(size_t files) {
   on([&] {
     try {
       rsLocalFiles = std::make_unique<LocalFileIndex>();
+      if (objSchema) KeepOnlyAskedNames(*rsLocalFiles, files);
       rsLocalFiles->Reserve(files);
     } catch (const std::bad_alloc&) {
       Raise(kErrUnableToCreate, "Unable to create an instance of ADODB.Recordset", kClass,

@@ -12,5 +12,7 @@ class LocalFileIndex;
 void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index);
 // The same without a report: false, with the index partly filled, at the first failure.
 bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index);
+// The same as FillLocalFileIndex without a report: what was reported once is not told again.
+void RefillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index);
 
 }  // namespace trl

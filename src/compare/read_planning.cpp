@@ -50,6 +50,7 @@ void Compare::StartReadAheadEarly() {
     applications = EveryElement(*objFingerprintDOM, vocab::a);
     size_t files = CountEveryElement(*objLocalFilesDOM, vocab::f);
     if (files == 0) return;
+    KeepOnlyAskedNames(*index, files);
     index->Reserve(files);
     if (!TryFillLocalFileIndex(*objLocalFilesDOM, *index)) return;
   } catch (...) {
@@ -58,6 +59,7 @@ void Compare::StartReadAheadEarly() {
   objFSO->Forget();
   rsLocalFiles = std::move(index);
   indexBuiltEarly_ = true;
+  localFilesChanges_ = objLocalFilesDOM->ModificationCount();
   StartReadAhead(applications);
   readAhead_->KeepAhead(kEarlyWindow);
 }
@@ -99,7 +101,9 @@ void Compare::PlanFileReads(const xml::Node& f) {
   try {
     std::string spelled = TextOf(f, vocab::f_name);
     plan.candidates.clear();
-    for (LocalFileRecord record : rsLocalFiles->Find(objSchema->EncodeName(LowerCase(spelled)))) {
+    std::string key = objSchema->EncodeName(LowerCase(spelled));
+    if (!rsLocalFiles->Covers(key)) return;  // the match widens the index first
+    for (LocalFileRecord record : rsLocalFiles->Find(key)) {
       plan.candidates.push_back(record);
     }
     if (plan.candidates.empty()) return;

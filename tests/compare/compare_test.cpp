@@ -233,6 +233,38 @@ TEST_F(CompareTest, IndexFailuresAreReportedInTheirPlaceWhateverReadsAhead) {
   }
 }
 
+// The local files are indexed at an asynchronous Start, for only the names the fingerprint then
+// has when they far outnumber its files; a client may still change either document before the
+// run, which matches them as they are then.
+TEST_F(CompareTest, DocumentsChangedAfterAnAsynchronousStartAreMatchedAsTheyAreThen) {
+  std::vector<std::string> files = {"two.exe"};
+  for (int i = 0; i < 8; ++i) files.push_back("other" + std::to_string(i) + ".txt");
+  for (bool renamedInFingerprint : {false, true}) {
+    SCOPED_TRACE(renamedInFingerprint ? "fingerprint file renamed" : "local file added");
+    Compare compare(std::make_unique<NamedFiles>());
+    compare.ReadThreads(2);
+    std::string results;
+    compare.OnStatusUpdate([&](const std::string&, const std::string& text) {
+      if (!text.empty()) results = text;
+    });
+    auto local = Parse(LocalFiles({{"\\p\\", files}}));
+    auto fingerprint = Parse("<fp><a a_id='1'>" +
+                             Version("v_id='1' v_name='v' v_seq='1'", "one.exe:1") + "</a></fp>");
+    EXPECT_EQ(compare.Start(nullptr, local, fingerprint), "");
+    if (renamedInFingerprint) {
+      fingerprint->AsNode().SelectSingleNode("//f").SetAttribute("f_name", "two.exe");
+    } else {
+      xml::Node f = local->CreateElement("f");
+      f.SetAttribute("f_text", "one.exe");
+      f.SetAttribute("f_name", "one.exe");
+      local->AsNode().SelectSingleNode("//d").AppendChild(f);
+    }
+    ASSERT_TRUE(EventLoop::Current().RunUntil([&] { return compare.Status() == kStatusComplete; },
+                                              std::chrono::seconds(10)));
+    EXPECT_EQ(Summary(results), "c=localhost d=\\p\\ a=1^1 v 1/1/1");
+  }
+}
+
 TEST_F(CompareTest, CandidatesAreTestedOnTheirOwnComputerAndOnlyWhereTheFolderFits) {
   std::string localFiles =
       "<trl_applicationdata>" +
