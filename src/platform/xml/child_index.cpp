@@ -23,6 +23,8 @@ std::optional<std::string_view> KeyOf(pugi::xml_node child, std::string_view tag
 pugi::xml_node ChildIndex::Find(pugi::xml_node parent, std::string_view tag, std::string_view attr,
                                 std::string_view value) {
   auto& indexes = byParent_[parent.internal_object()];
+  lastParent_ = parent.internal_object();
+  lastIndexes_ = &indexes;
   auto it = std::find_if(indexes.begin(), indexes.end(), [&](const KeyIndex& index) {
     return index.tag == tag && index.first.Attr() == attr;
   });
@@ -63,10 +65,22 @@ bool ChildIndex::Erase(KeyIndex& index, pugi::xml_node child) {
 template <typename Change>
 void ChildIndex::Update(pugi::xml_node parent, Change change) {
   if (byParent_.empty()) return;
-  auto it = byParent_.find(parent.internal_object());
-  if (it == byParent_.end()) return;
-  std::erase_if(it->second, [&](KeyIndex& index) { return !change(index); });
-  if (it->second.empty()) byParent_.erase(it);
+  std::vector<KeyIndex>* indexes = IndexesOf(parent.internal_object());
+  if (!indexes) return;
+  std::erase_if(*indexes, [&](KeyIndex& index) { return !change(index); });
+  if (indexes->empty()) {
+    byParent_.erase(parent.internal_object());
+    ForgetLastParent();
+  }
+}
+
+std::vector<ChildIndex::KeyIndex>* ChildIndex::IndexesOf(pugi::xml_node_struct* parent) {
+  if (parent != lastParent_) {
+    auto it = byParent_.find(parent);
+    lastParent_ = parent;
+    lastIndexes_ = it == byParent_.end() ? nullptr : &it->second;
+  }
+  return lastIndexes_;
 }
 
 void ChildIndex::ChildArrived(pugi::xml_node parent, pugi::xml_node child) {
@@ -88,16 +102,21 @@ void ChildIndex::KeyChanged(pugi::xml_node child, std::string_view attr) {
 }
 
 void ChildIndex::SubtreeDestroying(pugi::xml_node root) {
+  ForgetLastParent();  // its memory may come back as a new node
   for (pugi::xml_node node = root; node && !byParent_.empty(); node = NextInSubtree(node, root)) {
     byParent_.erase(node.internal_object());
   }
 }
 
 void ChildIndex::ChildrenDestroying(pugi::xml_node parent) {
+  ForgetLastParent();
   byParent_.erase(parent.internal_object());
   for (pugi::xml_node child : parent.children()) SubtreeDestroying(child);
 }
 
-void ChildIndex::Clear() { byParent_.clear(); }
+void ChildIndex::Clear() {
+  byParent_.clear();
+  ForgetLastParent();
+}
 
 }  // namespace trl::xml

@@ -51,7 +51,15 @@ class ChildIndex {
   template <typename Change>
   void Update(pugi::xml_node parent, Change change);
 
+  // The indexes of `parent`, or none. Appends and attribute writes come in runs under one parent:
+  // the last answer is kept, as a map lookup for each was a good part of building a large
+  // document.
+  std::vector<KeyIndex>* IndexesOf(pugi::xml_node_struct* parent);
+  void ForgetLastParent() { lastParent_ = nullptr; }
+
   std::unordered_map<pugi::xml_node_struct*, std::vector<KeyIndex>> byParent_;
+  pugi::xml_node_struct* lastParent_ = nullptr;
+  std::vector<KeyIndex>* lastIndexes_ = nullptr;  // byParent_'s entry for it, or none
 };
 
 }  // namespace trl::xml
