@@ -4,6 +4,8 @@
 
 #include <cstdint>
 
+#include "platform/byte_words.h"
+
 namespace trl {
 namespace {
 
@@ -26,15 +28,16 @@ void AppendUtf8(std::string& out, char32_t cp) {
   out.append(reinterpret_cast<const char*>(buffer), static_cast<size_t>(n));
 }
 
-// The length of the leading run of ASCII bytes that `keep`.
-template <class Keep>
-size_t AsciiPrefix(std::string_view text, Keep keep) {
-  size_t i = 0;
-  while (i < text.size() && static_cast<unsigned char>(text[i]) < 0x80 &&
-         keep(static_cast<unsigned char>(text[i]))) {
-    ++i;
-  }
-  return i;
+// The length of the leading run of printable ASCII bytes (no control character) that `keep`,
+// where `keepWord` tells it of eight of them at once.
+template <class KeepWord, class Keep>
+size_t PrintablePrefix(std::string_view text, KeepWord keepWord, Keep keep) {
+  return PassingPrefix(
+      text,
+      [&](uint64_t word) {
+        return !WordHasNonAscii(word) && !WordHasByteBelow(word, 0x20) && keepWord(word);
+      },
+      [&](unsigned char byte) { return byte >= 0x20 && byte < 0x80 && keep(byte); });
 }
 
 // Characters a name cannot carry as they are: those XML cannot hold, all control characters (an
@@ -55,7 +58,9 @@ bool IsXmlChar(char32_t cp) {
 
 std::string LowerCase(std::string_view text) {
   // Names are mostly ASCII: that part is copied and lowered in place, without a test per append.
-  size_t i = AsciiPrefix(text, [](unsigned char) { return true; });
+  size_t i = PassingPrefix(
+      text, [](uint64_t word) { return !WordHasNonAscii(word); },
+      [](unsigned char byte) { return byte < 0x80; });
   std::string out(text.substr(0, i));
   for (char& c : out) c = static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c);
   if (i == text.size()) return out;
@@ -95,7 +100,8 @@ bool IsValidUtf8(std::string_view text) {
 }
 
 bool IsXmlSafe(std::string_view text) {
-  for (size_t i = AsciiPrefix(text, [](unsigned char byte) { return byte >= 0x20; });
+  for (size_t i = PrintablePrefix(
+           text, [](uint64_t) { return true; }, [](unsigned char) { return true; });
        i < text.size();) {
     auto byte = static_cast<unsigned char>(text[i]);
     if (byte < 0x80) {
@@ -112,7 +118,9 @@ bool IsXmlSafe(std::string_view text) {
 }
 
 std::string NameFromNative(std::string_view bytes) {
-  size_t i = AsciiPrefix(bytes, [](unsigned char byte) { return byte >= 0x20 && byte != '\\'; });
+  size_t i = PrintablePrefix(
+      bytes, [](uint64_t word) { return !WordHasByte(word, '\\'); },
+      [](unsigned char byte) { return byte != '\\'; });
   std::string out(bytes.substr(0, i));
   if (i == bytes.size()) return out;
   out.reserve(bytes.size());

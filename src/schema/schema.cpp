@@ -5,6 +5,7 @@
 #include <limits>
 #include <utility>
 
+#include "platform/byte_words.h"
 #include "platform/failure.h"
 #include "platform/host_name.h"
 #include "platform/text.h"
@@ -65,8 +66,12 @@ void CopyAttribute(const xml::Node& from, xml::Node& to, const char* attribute) 
 
 std::string PercentEscaped(std::string text) {
   static constexpr char kHex[] = "0123456789ABCDEF";
-  if (std::none_of(text.begin(), text.end(),
-                   [](char c) { return NeedsPercentEscape(static_cast<unsigned char>(c)); })) {
+  auto plainWord = [](uint64_t word) {
+    return !WordHasByteBelow(word, 0x20) && !WordHasByte(word, 0x7F) && !WordHasByte(word, '%') &&
+           !WordHasByte(word, '\'') && !WordHasByte(word, '"');
+  };
+  if (PassingPrefix(text, plainWord,
+                    [](unsigned char byte) { return !NeedsPercentEscape(byte); }) == text.size()) {
     return text;  // the common case, without a second copy
   }
   std::string encoded;

@@ -59,6 +59,25 @@ TEST(TextTest, NameFromNativeEscapesWhatXmlOrPathsCannotCarry) {
   }
 }
 
+// Long names are scanned eight bytes at a time: what needs a change is seen wherever it stands.
+TEST(TextTest, EveryByteOfALongNameCounts) {
+  const std::string plain(19, 'a');
+  for (size_t at = 0; at < plain.size(); ++at) {
+    auto with = [&](std::string_view piece) {
+      return plain.substr(0, at) + std::string(piece) + plain.substr(at + 1);
+    };
+    SCOPED_TRACE(at);
+    EXPECT_TRUE(IsXmlSafe(with("\x7F")));
+    EXPECT_FALSE(IsXmlSafe(with("\x01")));
+    EXPECT_FALSE(IsXmlSafe(with("\xFF")));
+    EXPECT_EQ(NameFromNative(with("\\")), with("\xEF\x9D\x9C"));
+    EXPECT_EQ(NameFromNative(with("\x1F")), with("\xEF\x9C\x9F"));
+    EXPECT_EQ(NameFromNative(with("\xC3\x84")), with("\xC3\x84"));
+    EXPECT_EQ(LowerCase(with("Q")), with("q"));
+    EXPECT_EQ(LowerCase(with("\xC3\x84")), with("\xC3\xA4"));
+  }
+}
+
 // Random names made of pieces of a text rich in what needs escaping (separator, control byte,
 // multi-byte and escape-block characters, a noncharacter, a stray byte) and of random bytes.
 TEST(TextTest, NativeNamesRoundTripAsXmlSafeText) {

@@ -24,7 +24,12 @@ TEST(SchemaTest, EncodeName) {
       {"100%", "100%25"},
       {R"(say "Hi")", "say %22hi%22"},
       {std::string_view("tab\t\x01\x1F\x7F ", 8), "tab%09%01%1F%7F "},
-      {"\xC3\x84\xC3\x96.TXT", "\xC3\xA4\xC3\xB6.txt"}};
+      {"\xC3\x84\xC3\x96.TXT", "\xC3\xA4\xC3\xB6.txt"},
+      // Past the first eight bytes, and in the last few
+      {"readme-first'copy", "readme-first%27copy"},
+      {"0123456789abcde\x7F", "0123456789abcde%7F"},
+      {"0123456789ABCDEF\"", "0123456789abcdef%22"},
+      {"0123456789abcdef\x05!", "0123456789abcdef%05!"}};
   Schema schema;
   for (const auto& [name, encoded] : cases) EXPECT_EQ(schema.EncodeName(name), encoded) << name;
 }
