@@ -138,6 +138,13 @@ void Compare::PlanPathReads(const std::string& path, unsigned wanted) {
     return;
   }
   try {
+    if (!facts.exists.Settled()) {
+      // The match asks whether the file is there, then for it: one lookup answers both.
+      std::unique_ptr<fs::File> found = objFSO->FileIfExists(path);
+      bool there = found != nullptr;
+      facts.exists.Get([&] { return there; });
+      if (there) facts.file.Get([&] { return std::move(found); });
+    }
     if (!facts.exists.Get([&] { return objFSO->FileExists(path); })) return;
     const fs::File* file = facts.file.Get([&] { return objFSO->GetFile(path); }).get();
     if (!file || !file->OpensOnAnyThread()) return;

@@ -107,6 +107,10 @@ class FileSystem {
   // kPermissionDenied (70) when it cannot be reached.
   virtual std::unique_ptr<File> GetFile(std::string_view path) = 0;
   virtual std::unique_ptr<Folder> GetFolder(std::string_view path) = 0;
+  // The file where FileExists says there is one, else none: both questions in one lookup.
+  virtual std::unique_ptr<File> FileIfExists(std::string_view path) {
+    return FileExists(path) ? GetFile(path) : nullptr;
+  }
   // Drops whatever was learnt of the disk (listings, lookups), so that what follows sees it as it
   // is now. A stage calls it as each run begins: nothing learnt in one run is used by the next.
   virtual void Forget() {}

@@ -121,8 +121,9 @@ TEST_F(PosixFileSystemTest, ReachesItemsBelowPathsLongerThanPathMax) {
   EXPECT_EQ(ReadAll(*fs_->GetFile(path + "\\f")), std::to_string(kDepth - 1));
 }
 
-// What a path names decides what the lookups answer: whether a file or a folder exists, and the
-// failure GetFile and GetFolder raise (0: none), also once the item is gone.
+// What a path names decides what the lookups answer: whether a file or a folder exists (and the
+// file, in one lookup), and the failure GetFile and GetFolder raise (0: none), also once the item
+// is gone.
 TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
   tree_.AddFolder("dir");
   tree_.AddFile("file.txt", "x");
@@ -142,6 +143,9 @@ TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
   for (const auto& [path, file, folder, getFile, getFolder] : cases) {
     SCOPED_TRACE(path);
     EXPECT_EQ(fs_->FileExists(path), file);
+    auto found = fs_->FileIfExists(path);
+    EXPECT_EQ(found != nullptr, file);
+    if (found) EXPECT_EQ(ReadAll(*found), "x");
     EXPECT_EQ(fs_->FolderExists(path), folder);
     EXPECT_EQ(FailureOf([&] { fs_->GetFile(path); }), getFile);
     EXPECT_EQ(FailureOf([&] { fs_->GetFolder(path); }), getFolder);

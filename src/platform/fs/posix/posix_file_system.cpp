@@ -38,6 +38,17 @@ std::string ParentOf(const std::string& path, char separator) {
   return last == 0 ? std::string(1, separator) : path.substr(0, last);
 }
 
+// The file a lookup found.
+std::unique_ptr<File> FileOf(Item item) {
+  auto folder =
+      std::make_shared<FolderPlace>(ParentOf(item.native, '/'), ParentOf(item.path, '\\'));
+  // Following the link, a regular file is not a system file whether or not it was reached
+  // through a link; anything else needs an lstat to decide.
+  unsigned char type = S_ISREG(item.status->mode) ? DT_REG : DT_UNKNOWN;
+  return std::make_unique<PosixFile>(std::move(folder), std::move(item.nativeName), type,
+                                     item.status);
+}
+
 // Not safe for use by several threads at once: a run owns one.
 class PosixFileSystem final : public FileSystem {
  public:
@@ -57,13 +68,13 @@ class PosixFileSystem final : public FileSystem {
     Item item;
     if (int error = Find(path, item)) Fail(LookupFailure(error, kFileNotFound));
     if (item.IsFolder() || item.mustBeFolder) Fail(kFileNotFound);
-    auto folder =
-        std::make_shared<FolderPlace>(ParentOf(item.native, '/'), ParentOf(item.path, '\\'));
-    // Following the link, a regular file is not a system file whether or not it was reached
-    // through a link; anything else needs an lstat to decide.
-    unsigned char type = S_ISREG(item.status->mode) ? DT_REG : DT_UNKNOWN;
-    return std::make_unique<PosixFile>(std::move(folder), std::move(item.nativeName), type,
-                                       item.status);
+    return FileOf(std::move(item));
+  }
+
+  std::unique_ptr<File> FileIfExists(std::string_view path) override {
+    Item item;
+    if (Find(path, item) != 0 || item.IsFolder() || item.mustBeFolder) return nullptr;
+    return FileOf(std::move(item));
   }
 
   std::unique_ptr<Folder> GetFolder(std::string_view path) override {
