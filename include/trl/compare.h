@@ -200,6 +200,7 @@ class TRL_API Compare : public Worker {
   unsigned readThreads_;
   bool indexBuiltEarly_ = false;    // rsLocalFiles was filled in Start, without a report
   uint64_t localFilesChanges_ = 0;  // the local files' modification count then
+  size_t localFilesCount_ = 0;      // their f elements
   struct TRL_LOCAL ReadPlan;
   std::unique_ptr<ReadPlan> readPlan_;
   // Reads files of filesSeen_, so it goes first.

@@ -100,7 +100,10 @@ void Compare::Match() {
     e_a_total = ToInt32(static_cast<double>(applications.size()));
   });
   size_t files = 0;
-  on([&] { files = CountEveryElement(*objLocalFilesDOM, vocab::f); });
+  // Counted already when the index was made at Start, of the same local files.
+  on([&] {
+    files = indexBuiltEarly_ ? localFilesCount_ : CountEveryElement(*objLocalFilesDOM, vocab::f);
+  });
   if (files != 0) {
     BeginRun(on);
     FillRecordset(files);

@@ -99,9 +99,10 @@ void RefillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
 void Compare::KeepOnlyAskedNames(LocalFileIndex& index, size_t files) const {
   std::vector<std::string> keys{""};  // what a version whose first name cannot be read asks for
   try {
+    std::vector<xml::Node> named = EveryElement(*objFingerprintDOM, vocab::f);
     // Worth it only where most local files have names no fingerprint file has.
-    if (files < 4 * CountEveryElement(*objFingerprintDOM, vocab::f)) return;
-    for (const xml::Node& f : EveryElement(*objFingerprintDOM, vocab::f)) {
+    if (files < 4 * named.size()) return;
+    for (const xml::Node& f : named) {
       if (auto name = f.GetAttribute(vocab::f_name)) {
         keys.push_back(objSchema->EncodeName(LowerCase(*name)));
       }

@@ -46,9 +46,10 @@ void Compare::StartReadAheadEarly() {
   if (readThreads_ == 0 || !objFSO || !objSchema) return;
   std::vector<xml::Node> applications;
   auto index = std::make_unique<LocalFileIndex>();
+  size_t files = 0;
   try {
     applications = EveryElement(*objFingerprintDOM, vocab::a);
-    size_t files = CountEveryElement(*objLocalFilesDOM, vocab::f);
+    files = CountEveryElement(*objLocalFilesDOM, vocab::f);
     if (files == 0) return;
     KeepOnlyAskedNames(*index, files);
     index->Reserve(files);
@@ -60,6 +61,7 @@ void Compare::StartReadAheadEarly() {
   rsLocalFiles = std::move(index);
   indexBuiltEarly_ = true;
   localFilesChanges_ = objLocalFilesDOM->ModificationCount();
+  localFilesCount_ = files;
   StartReadAhead(applications);
   readAhead_->KeepAhead(kEarlyWindow);
 }
