@@ -36,6 +36,8 @@ class TRL_API Node {
 
   // Null (std::nullopt) when the attribute is absent; "" only when it is present and empty.
   std::optional<std::string> GetAttribute(std::string_view name) const;
+  // The same without a copy, valid until the attribute is changed or removed.
+  std::optional<std::string_view> GetAttributeView(std::string_view name) const;
   // Updates the value in place, or appends the attribute after the existing ones. Fails with
   // kInvalidArgument (5) for a bad name or for text that XML 1.0 cannot carry.
   void SetAttribute(std::string_view name, std::string_view value);

@@ -139,9 +139,14 @@ const std::vector<FolderAlias>& LocalFileIndex::AliasesOf(const LocalFileRecord&
 
 void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, size_t caseExactFrom) {
   if (drives_.empty()) AddDrive("", "", false, "", "");
+  AddFolder(std::move(folder), std::move(exactFolder), caseExactFrom,
+            static_cast<uint32_t>(drives_.size() - 1));
+}
+
+void LocalFileIndex::AddFolder(std::string folder, std::string exactFolder, size_t caseExactFrom,
+                               uint32_t drive) {
   // Listed only once a file in it is kept: most folders hold none when names are filtered.
-  pendingFolder_ = FolderEntry{std::move(folder), std::move(exactFolder),
-                               static_cast<uint32_t>(drives_.size() - 1), caseExactFrom};
+  pendingFolder_ = FolderEntry{std::move(folder), std::move(exactFolder), drive, caseExactFrom};
 }
 
 void LocalFileIndex::AddFile(std::string_view filename, std::string_view encodedFilename) {

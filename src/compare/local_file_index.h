@@ -83,8 +83,10 @@ class LocalFileIndex {
   // that asks for no other name needs no record of the rest, and most files on a disk have names
   // no fingerprint knows. Given before the first file.
   void KeepOnly(const std::vector<std::string>& keys);
-  // Whether Find answers for `key` as it would without KeepOnly.
+  // Whether Find answers for `key` as it would without KeepOnly: whether a file of that encoded
+  // name may be kept.
   bool Covers(std::string_view key) const;
+  bool Filtered() const { return !filter_.empty(); }
 
   // Room for `files` records and as many names, made at once (with KeepOnly, for the names kept).
   void Reserve(size_t files);
@@ -96,6 +98,9 @@ class LocalFileIndex {
   // lower-cased and as written.
   void AddFolder(std::string folder, std::string exactFolder,
                  size_t caseExactFrom = std::string::npos);
+  // The same on the drive added `drive`-th (from 0), rather than the last.
+  void AddFolder(std::string folder, std::string exactFolder, size_t caseExactFrom, uint32_t drive);
+  size_t Drives() const { return drives_.size(); }
   // A record in the last folder added (none yet: an empty one). The encoded name is kept
   // lower-cased and folded, the plain name as given.
   void AddFile(std::string_view filename, std::string_view encodedFilename);

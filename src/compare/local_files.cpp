@@ -74,6 +74,7 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
 }
 
 bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
+  if (index.Filtered()) return TryFillFilteredIndex(localFiles, index);
   try {
     Fill(localFiles, &index, [](auto&& step) {
       step();

@@ -12,6 +12,9 @@ class LocalFileIndex;
 void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index);
 // The same without a report: false, with the index partly filled, at the first failure.
 bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index);
+// The same for an index that keeps only some names (LocalFileIndex::KeepOnly): the walk of the
+// files shared out among threads. Nothing may change the document meanwhile.
+bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index);
 // The same as FillLocalFileIndex without a report: what was reported once is not told again.
 void RefillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index);
 

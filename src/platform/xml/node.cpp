@@ -101,10 +101,15 @@ Document& Node::OwnerDocument() const {
 }
 
 std::optional<std::string> Node::GetAttribute(std::string_view name) const {
+  if (auto value = GetAttributeView(name)) return std::string(*value);
+  return std::nullopt;
+}
+
+std::optional<std::string_view> Node::GetAttributeView(std::string_view name) const {
   // A walk of the attributes needs no terminated copy of the name.
   for (pugi::xml_attribute attr = Require(*this).first_attribute(); attr;
        attr = attr.next_attribute()) {
-    if (TerminatedEquals(attr.name(), name)) return std::string(attr.value());
+    if (TerminatedEquals(attr.name(), name)) return std::string_view(attr.value());
   }
   return std::nullopt;
 }

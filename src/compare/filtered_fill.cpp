@@ -1,0 +1,106 @@
+// Filling an index that keeps few of the local files: the walk of the million others is the
+// cost, and it reads the document only, so it is shared out among threads while nothing else
+// uses the document; the few files kept are added on this thread, in document order.
+#include <algorithm>
+#include <span>
+#include <string>
+#include <thread>
+#include <utility>
+#include <vector>
+
+#include "compare/local_file_index.h"
+#include "compare/local_files.h"
+#include "frame/attributes.h"
+#include "frame/vocabulary.h"
+#include "platform/text.h"
+#include "schema/schema.h"
+
+namespace trl {
+namespace {
+
+// A folder of the local files, and what of it the index keeps.
+struct ListedFolder {
+  xml::Node d;
+  uint32_t drive;
+  std::string folder, exactFolder;
+  size_t caseExactFrom = std::string::npos;
+  std::vector<std::pair<std::string, std::string>> kept;  // file name, encoded name
+};
+
+// Reads `folders` and the names of their files, keeping those the index may keep; false at the
+// first value that cannot be read.
+bool ReadFolders(std::span<ListedFolder> folders, const LocalFileIndex& index) {
+  try {
+    for (ListedFolder& listed : folders) {
+      listed.exactFolder = TextOf(listed.d, vocab::d_text);
+      listed.folder = LowerCase(listed.exactFolder);
+      listed.caseExactFrom = Schema::ExactFrom(TextOf(listed.d, vocab::d_name), listed.exactFolder);
+      for (const xml::Node& f : listed.d.ChildElements(vocab::f)) {
+        auto text = f.GetAttributeView(vocab::f_text);
+        auto name = f.GetAttributeView(vocab::f_name);
+        if (!text || !name) return false;
+        if (index.Covers(*name)) listed.kept.emplace_back(*text, *name);
+      }
+    }
+  } catch (...) {
+    return false;
+  }
+  return true;
+}
+
+}  // namespace
+
+bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index) {
+  std::vector<ListedFolder> folders;
+  try {
+    if (!localFiles.DocumentElement()) return false;
+    for (const xml::Node& c : localFiles.AsNode().GetElementsByTagName(vocab::c)) {
+      std::string machine = TextOf(c, vocab::c_text);
+      std::string encodedMachine = TextOf(c, vocab::c_name);
+      bool local = c.GetAttribute(vocab::c_local) == "1";
+      for (const xml::Node& m : c.ChildElements(vocab::m)) {
+        index.AddDrive(machine, encodedMachine, local, TextOf(m, vocab::m_text),
+                       TextOf(m, vocab::m_name));
+        for (const xml::Node& l : m.ChildElements(vocab::l)) {
+          auto text = l.GetAttribute(vocab::l_text);
+          auto target = l.GetAttribute(vocab::l_target);
+          if (text && target) index.AddLink(LowerCase(*text), LowerCase(*target));
+        }
+        auto drive = static_cast<uint32_t>(index.Drives() - 1);
+        for (const xml::Node& d : m.ChildElements(vocab::d)) folders.push_back({d, drive});
+      }
+    }
+  } catch (...) {
+    return false;
+  }
+  // Each thread reads a run of folders; this one the last.
+  size_t threads = std::clamp<size_t>(std::thread::hardware_concurrency(), 1, 4);
+  size_t share = (folders.size() + threads - 1) / threads;
+  std::vector<std::thread> helpers;
+  std::vector<char> read(threads, 0);
+  std::span<ListedFolder> all(folders);
+  for (size_t i = 0; i + 1 < threads && (i + 1) * share < folders.size(); ++i) {
+    helpers.emplace_back([&, i] { read[i] = ReadFolders(all.subspan(i * share, share), index); });
+  }
+  size_t mine = helpers.size() * share;
+  read.back() = ReadFolders(all.subspan(mine), index);
+  for (std::thread& helper : helpers) helper.join();
+  if (!std::all_of(read.begin(), read.begin() + static_cast<ptrdiff_t>(helpers.size()),
+                   [](char ok) { return ok != 0; }) ||
+      read.back() == 0) {
+    return false;
+  }
+  try {
+    for (ListedFolder& listed : folders) {
+      if (listed.kept.empty()) continue;
+      index.AddFolder(std::move(listed.folder), std::move(listed.exactFolder), listed.caseExactFrom,
+                      listed.drive);
+      for (const auto& [name, encoded] : listed.kept) index.AddFile(name, encoded);
+    }
+  } catch (...) {
+    return false;
+  }
+  return true;
+}
+
+}  // namespace trl
