@@ -145,7 +145,9 @@ TEST_F(PosixFileSystemTest, LookupsAnswerByKindOfItem) {
     EXPECT_EQ(fs_->FileExists(path), file);
     auto found = fs_->FileIfExists(path);
     EXPECT_EQ(found != nullptr, file);
-    if (found) EXPECT_EQ(ReadAll(*found), "x");
+    if (found) {
+      EXPECT_EQ(ReadAll(*found), "x");
+    }
     EXPECT_EQ(fs_->FolderExists(path), folder);
     EXPECT_EQ(FailureOf([&] { fs_->GetFile(path); }), getFile);
     EXPECT_EQ(FailureOf([&] { fs_->GetFolder(path); }), getFolder);
