@@ -217,15 +217,20 @@ TEST_F(CompareTest, PropertiesAddTheBitsOfTheirWeightsWhenTheyAgree) {
 
 // A local file that cannot be read into the index is reported while the run fills it, after what
 // preparing the fingerprint reported, however many threads read ahead; the others are matched.
+// Also where the local files far outnumber the fingerprint's, so that few are indexed.
 TEST_F(CompareTest, IndexFailuresAreReportedInTheirPlaceWhateverReadsAhead) {
-  std::string local = LocalFiles({{"\\", {"data.bin"}}});
-  local.insert(local.find("</d>"), "<f f_text='nameless'/>");
-  for (unsigned threads : {0u, 2u}) {
+  std::vector<std::string> many;
+  for (int i = 0; i < 8; ++i) many.push_back("other" + std::to_string(i) + ".txt");
+  for (auto [threads, others] : {std::pair{0u, false}, {2u, false}, {2u, true}}) {
+    std::vector<LocalFolder> folders = {{"\\", {"data.bin"}}};
+    if (others) folders.push_back({"\\more\\", many});
+    std::string local = LocalFiles(folders);
+    local.insert(local.find("</d>"), "<f f_text='nameless'/>");
     SwitchedCompare compare(true, std::make_unique<NamedFiles>(), false);
     compare.Asynchronous(false);
     compare.ReadThreads(threads);
     std::string results = compare.Start(nullptr, Parse(local), Parse(OneFileFingerprint("2/x/8")));
-    SCOPED_TRACE(threads);
+    SCOPED_TRACE(std::to_string(threads) + (others ? " with other files" : ""));
     EXPECT_EQ(Summary(results), "c=localhost d=\\ a=1^1 v 1/1/1");
     std::vector<std::string> where;
     for (const ReportedEvent& e : EventsIn(*Parse(results))) where.push_back(e.procedure);
@@ -237,8 +242,8 @@ TEST_F(CompareTest, IndexFailuresAreReportedInTheirPlaceWhateverReadsAhead) {
 // has when they far outnumber its files; a client may still change either document before the
 // run, which matches them as they are then.
 TEST_F(CompareTest, DocumentsChangedAfterAnAsynchronousStartAreMatchedAsTheyAreThen) {
-  std::vector<std::string> files = {"two.exe"};
-  for (int i = 0; i < 8; ++i) files.push_back("other" + std::to_string(i) + ".txt");
+  std::vector<std::string> others;
+  for (int i = 0; i < 8; ++i) others.push_back("other" + std::to_string(i) + ".txt");
   for (bool renamedInFingerprint : {false, true}) {
     SCOPED_TRACE(renamedInFingerprint ? "fingerprint file renamed" : "local file added");
     Compare compare(std::make_unique<NamedFiles>());
@@ -247,7 +252,7 @@ TEST_F(CompareTest, DocumentsChangedAfterAnAsynchronousStartAreMatchedAsTheyAreT
     compare.OnStatusUpdate([&](const std::string&, const std::string& text) {
       if (!text.empty()) results = text;
     });
-    auto local = Parse(LocalFiles({{"\\p\\", files}}));
+    auto local = Parse(LocalFiles({{"\\p\\", {"two.exe"}}, {"\\q\\", others}}));
     auto fingerprint = Parse("<fp><a a_id='1'>" +
                              Version("v_id='1' v_name='v' v_seq='1'", "one.exe:1") + "</a></fp>");
     EXPECT_EQ(compare.Start(nullptr, local, fingerprint), "");
