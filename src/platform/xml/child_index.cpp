@@ -22,8 +22,8 @@ std::optional<std::string_view> KeyOf(pugi::xml_node child, std::string_view tag
 
 pugi::xml_node ChildIndex::Find(pugi::xml_node parent, std::string_view tag, std::string_view attr,
                                 std::string_view value) {
-  auto& indexes = byParent_[parent.internal_object()];
-  lastParent_ = parent.internal_object();
+  std::vector<KeyIndex>* known = IndexesOf(parent.internal_object());
+  auto& indexes = known ? *known : byParent_[parent.internal_object()];
   lastIndexes_ = &indexes;
   auto it = std::find_if(indexes.begin(), indexes.end(), [&](const KeyIndex& index) {
     return index.tag == tag && index.first.Attr() == attr;
