@@ -117,8 +117,9 @@ class TRL_API Compare : public Worker {
   // Starts reading ahead the candidates of `applications`, planned as the match will test them.
   void StartReadAhead(const std::vector<xml::Node>& applications);
   // The same before the fingerprint is prepared, when the local-file index builds without a
-  // failure: the threads then hash while this one writes the fingerprint's bit values.
-  void StartReadAheadEarly();
+  // failure: the threads then hash while this one runs `upgrade` (the fingerprint's bit values),
+  // which is run once whatever happens.
+  void StartReadAheadEarly(const std::function<void()>& upgrade);
   void StopReadAhead();
   // Plans the reads of the next few fingerprint files; false once all are planned.
   bool PlanMoreReads();

@@ -74,8 +74,7 @@ void Compare::Prepare(xml::DocumentPtr& applicationOptions, xml::DocumentPtr& lo
   copiesById_.clear();
   knownCopies_.clear();
   filesSeen_.clear();
-  StartReadAheadEarly();
-  on([&] { UpgradeFingerprintData(*objFingerprintDOM); });
+  StartReadAheadEarly([&] { on([&] { UpgradeFingerprintData(*objFingerprintDOM); }); });
 }
 
 void Compare::RunBody() {

@@ -2,6 +2,7 @@
 // cost, and it reads the document only, so it is shared out among threads while nothing else
 // uses the document; the few files kept are added on this thread, in document order.
 #include <algorithm>
+#include <functional>
 #include <span>
 #include <string>
 #include <thread>
@@ -50,7 +51,8 @@ bool ReadFolders(std::span<ListedFolder> folders, const LocalFileIndex& index) {
 
 }  // namespace
 
-bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index) {
+bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index,
+                          const std::function<void()>& meanwhile) {
   std::vector<ListedFolder> folders;
   try {
     if (!localFiles.DocumentElement()) return false;
@@ -73,23 +75,28 @@ bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index) {
   } catch (...) {
     return false;
   }
-  // Each thread reads a run of folders; this one the last.
+  // Each thread reads a run of folders; this one the last, unless it has other work meanwhile.
   size_t threads = std::clamp<size_t>(std::thread::hardware_concurrency(), 1, 4);
-  size_t share = (folders.size() + threads - 1) / threads;
-  std::vector<std::thread> helpers;
-  std::vector<char> read(threads, 0);
+  size_t parts = threads;
+  size_t helping = meanwhile ? parts : parts - 1;
+  size_t share = (folders.size() + parts - 1) / parts;
   std::span<ListedFolder> all(folders);
-  for (size_t i = 0; i + 1 < threads && (i + 1) * share < folders.size(); ++i) {
-    helpers.emplace_back([&, i] { read[i] = ReadFolders(all.subspan(i * share, share), index); });
+  std::vector<char> read(parts, 1);
+  {
+    std::vector<std::jthread> helpers;  // joined when the block ends, however it ends
+    for (size_t i = 0; i < helping && i * share < folders.size(); ++i) {
+      helpers.emplace_back([&, i] {
+        read[i] =
+            ReadFolders(all.subspan(i * share, std::min(share, folders.size() - i * share)), index);
+      });
+    }
+    if (meanwhile) {
+      meanwhile();
+    } else if (helping * share < folders.size()) {
+      read.back() = ReadFolders(all.subspan(helping * share), index);
+    }
   }
-  size_t mine = helpers.size() * share;
-  read.back() = ReadFolders(all.subspan(mine), index);
-  for (std::thread& helper : helpers) helper.join();
-  if (!std::all_of(read.begin(), read.begin() + static_cast<ptrdiff_t>(helpers.size()),
-                   [](char ok) { return ok != 0; }) ||
-      read.back() == 0) {
-    return false;
-  }
+  if (!std::all_of(read.begin(), read.end(), [](char ok) { return ok != 0; })) return false;
   try {
     for (ListedFolder& listed : folders) {
       if (listed.kept.empty()) continue;

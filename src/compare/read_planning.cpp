@@ -3,6 +3,8 @@
 // here is left to the match, which meets the same failure where it always did and reports it; a
 // file's existence and handle, learnt here, are replayed to the match as they were learnt.
 
+#include <utility>
+
 #include "compare/candidates.h"
 #include "compare/file_facts.h"
 #include "compare/fingerprint_file.h"
@@ -42,20 +44,28 @@ void Compare::StartReadAhead(const std::vector<xml::Node>& applications) {
   readAhead_->KeepAhead();
 }
 
-void Compare::StartReadAheadEarly() {
-  if (readThreads_ == 0 || !objFSO || !objSchema) return;
+void Compare::StartReadAheadEarly(const std::function<void()>& upgrade) {
+  // Whatever way this goes, the fingerprint is upgraded once: while other threads read the
+  // local files when that is how they are indexed, else once reading ahead has begun.
+  bool upgraded = false;
+  auto upgradeOnce = [&] {
+    if (!std::exchange(upgraded, true)) upgrade();
+  };
+  if (readThreads_ == 0 || !objFSO || !objSchema) return upgradeOnce();
   std::vector<xml::Node> applications;
   auto index = std::make_unique<LocalFileIndex>();
   size_t files = 0;
   try {
     applications = EveryElement(*objFingerprintDOM, vocab::a);
     files = CountEveryElement(*objLocalFilesDOM, vocab::f);
-    if (files == 0) return;
+    if (files == 0) return upgradeOnce();
     KeepOnlyAskedNames(*index, files);
     index->Reserve(files);
-    if (!TryFillLocalFileIndex(*objLocalFilesDOM, *index)) return;
+    bool filled = index->Filtered() ? TryFillFilteredIndex(*objLocalFilesDOM, *index, upgradeOnce)
+                                    : TryFillLocalFileIndex(*objLocalFilesDOM, *index);
+    if (!filled) return upgradeOnce();
   } catch (...) {
-    return;  // the run meets the failure again, and reports it
+    return upgradeOnce();  // the run meets the failure again, and reports it
   }
   objFSO->Forget();
   rsLocalFiles = std::move(index);
@@ -64,6 +74,7 @@ void Compare::StartReadAheadEarly() {
   localFilesCount_ = files;
   StartReadAhead(applications);
   readAhead_->KeepAhead(kEarlyWindow);
+  upgradeOnce();
 }
 
 void Compare::StopReadAhead() {
