@@ -21,6 +21,8 @@ namespace {
 
 // A folder of the local files, and what of it the index keeps.
 struct ListedFolder {
+  ListedFolder(xml::Node d, uint32_t drive) : d(d), drive(drive) {}
+
   xml::Node d;
   uint32_t drive;
   std::string folder, exactFolder;
@@ -69,7 +71,7 @@ bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index,
           if (text && target) index.AddLink(LowerCase(*text), LowerCase(*target));
         }
         auto drive = static_cast<uint32_t>(index.Drives() - 1);
-        for (const xml::Node& d : m.ChildElements(vocab::d)) folders.push_back({d, drive});
+        for (const xml::Node& d : m.ChildElements(vocab::d)) folders.emplace_back(d, drive);
       }
     }
   } catch (...) {
