@@ -61,6 +61,8 @@ void Compare::StartReadAheadEarly(const std::function<void()>& upgrade) {
     if (files == 0) return upgradeOnce();
     KeepOnlyAskedNames(*index, files);
     index->Reserve(files);
+    // Filtered, the local files are another document than the fingerprint (one document given as
+    // both has as many files as the fingerprint): the upgrade can write while they are read.
     bool filled = index->Filtered() ? TryFillFilteredIndex(*objLocalFilesDOM, *index, upgradeOnce)
                                     : TryFillLocalFileIndex(*objLocalFilesDOM, *index);
     if (!filled) return upgradeOnce();
