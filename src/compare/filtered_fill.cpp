@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "compare/drive_walk.h"
 #include "compare/local_file_index.h"
 #include "compare/local_files.h"
 #include "frame/attributes.h"
@@ -57,23 +58,12 @@ bool TryFillFilteredIndex(xml::Document& localFiles, LocalFileIndex& index,
                           const std::function<void()>& meanwhile) {
   std::vector<ListedFolder> folders;
   try {
-    if (!localFiles.DocumentElement()) return false;
-    for (const xml::Node& c : localFiles.AsNode().GetElementsByTagName(vocab::c)) {
-      std::string machine = TextOf(c, vocab::c_text);
-      std::string encodedMachine = TextOf(c, vocab::c_name);
-      bool local = c.GetAttribute(vocab::c_local) == "1";
-      for (const xml::Node& m : c.ChildElements(vocab::m)) {
-        index.AddDrive(machine, encodedMachine, local, TextOf(m, vocab::m_text),
-                       TextOf(m, vocab::m_name));
-        for (const xml::Node& l : m.ChildElements(vocab::l)) {
-          auto text = l.GetAttribute(vocab::l_text);
-          auto target = l.GetAttribute(vocab::l_target);
-          if (text && target) index.AddLink(LowerCase(*text), LowerCase(*target));
-        }
-        auto drive = static_cast<uint32_t>(index.Drives() - 1);
-        for (const xml::Node& d : m.ChildElements(vocab::d)) folders.emplace_back(d, drive);
-      }
-    }
+    WalkDrives(
+        localFiles, &index, [](auto&& step) { step(); },
+        [&](const xml::Node& m) {
+          auto drive = static_cast<uint32_t>(index.Drives() - 1);
+          for (const xml::Node& d : m.ChildElements(vocab::d)) folders.emplace_back(d, drive);
+        });
   } catch (...) {
     return false;
   }

@@ -5,6 +5,7 @@
 #include <new>
 
 #include "compare/compare_names.h"
+#include "compare/drive_walk.h"
 #include "compare/folder_fit.h"
 #include "compare/local_file_index.h"
 #include "frame/attributes.h"
@@ -26,45 +27,25 @@ namespace {
 // Fills the index, each step run through `on`, which reports a failure or passes it on.
 template <class Steps>
 void Fill(xml::Document& localFiles, LocalFileIndex* index, const Steps& on) {
-  std::vector<xml::Node> computers;
-  on([&] {
-    if (!localFiles.DocumentElement()) Fail(kObjectNotSet);
-    computers = localFiles.AsNode().GetElementsByTagName(vocab::c);
-  });
   // A value that cannot be read keeps what the element before gave.
-  std::string machine, encodedMachine, drive, encodedDrive, folder, exactFolder, encodedFolder,
-      filename, encodedFilename;
-  for (const xml::Node& c : computers) {
-    on([&] { machine = TextOf(c, vocab::c_text); });
-    on([&] { encodedMachine = TextOf(c, vocab::c_name); });
-    bool local = c.GetAttribute(vocab::c_local) == "1";
-    for (const xml::Node& m : c.ChildElements(vocab::m)) {
-      on([&] { drive = TextOf(m, vocab::m_text); });
-      on([&] { encodedDrive = TextOf(m, vocab::m_name); });
-      on([&] { Use(index).AddDrive(machine, encodedMachine, local, drive, encodedDrive); });
-      for (const xml::Node& l : m.ChildElements(vocab::l)) {
-        auto text = l.GetAttribute(vocab::l_text);
-        auto target = l.GetAttribute(vocab::l_target);
-        if (index != nullptr && text && target)
-          index->AddLink(LowerCase(*text), LowerCase(*target));
-      }
-      for (const xml::Node& d : m.ChildElements(vocab::d)) {
-        on([&] {
-          exactFolder = TextOf(d, vocab::d_text);
-          folder = LowerCase(exactFolder);
-        });
-        on([&] { encodedFolder = TextOf(d, vocab::d_name); });
-        on([&] {
-          Use(index).AddFolder(folder, exactFolder, Schema::ExactFrom(encodedFolder, exactFolder));
-        });
-        for (const xml::Node& f : d.ChildElements(vocab::f)) {
-          on([&] { filename = TextOf(f, vocab::f_text); });
-          on([&] { encodedFilename = TextOf(f, vocab::f_name); });
-          on([&] { Use(index).AddFile(filename, encodedFilename); });
-        }
+  std::string folder, exactFolder, encodedFolder, filename, encodedFilename;
+  WalkDrives(localFiles, index, on, [&](const xml::Node& m) {
+    for (const xml::Node& d : m.ChildElements(vocab::d)) {
+      on([&] {
+        exactFolder = TextOf(d, vocab::d_text);
+        folder = LowerCase(exactFolder);
+      });
+      on([&] { encodedFolder = TextOf(d, vocab::d_name); });
+      on([&] {
+        Use(index).AddFolder(folder, exactFolder, Schema::ExactFrom(encodedFolder, exactFolder));
+      });
+      for (const xml::Node& f : d.ChildElements(vocab::f)) {
+        on([&] { filename = TextOf(f, vocab::f_text); });
+        on([&] { encodedFilename = TextOf(f, vocab::f_name); });
+        on([&] { Use(index).AddFile(filename, encodedFilename); });
       }
     }
-  }
+  });
 }
 
 }  // namespace
@@ -74,7 +55,6 @@ void FillLocalFileIndex(xml::Document& localFiles, LocalFileIndex* index) {
 }
 
 bool TryFillLocalFileIndex(xml::Document& localFiles, LocalFileIndex& index) {
-  if (index.Filtered()) return TryFillFilteredIndex(localFiles, index);
   try {
     Fill(localFiles, &index, [](auto&& step) {
       step();
