@@ -61,6 +61,10 @@ class ReadAhead {
   void Work();
   // Reads everything planned of `planned` on the calling thread.
   void Read(Planned& planned) const;
+  // Reads `kind` of `planned` when the plan wants it; a failure is kept as its value.
+  void ReadKind(Planned& planned, int kind) const;
+  // Marks a plan a worker began as read.
+  void Finished(Planned& planned);
   std::string ReadNow(const fs::File& file, int kind) const;
 
   const Schema& schema_;

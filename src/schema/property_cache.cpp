@@ -233,24 +233,33 @@ PropertyCache::~PropertyCache() {
 }
 
 std::string PropertyCache::Value(fs::FileReader& reader, int kind, const Read& read) {
+  Lookup lookup;
+  if (std::optional<std::string> stored = Stored(reader, kind, lookup)) return *stored;
+  std::string value = read(reader);
+  Keep(reader, kind, lookup, value);
+  return value;
+}
+
+std::optional<std::string> PropertyCache::Stored(fs::FileReader& reader, int kind, Lookup& lookup) {
   int64_t began = NowNanoseconds();
-  std::optional<fs::FileIdentity> before = reader.Identity();
+  lookup.before = reader.Identity();
   // Times after `began - settle` are too recent to vouch for the content, or lie in the future.
   int64_t latest = began - impl_->options.settle.count();
-  bool trusted = before && before->modified <= latest && before->changed <= latest;
-  if (trusted) {
-    std::lock_guard lock(impl_->mutex);
-    if (auto value = impl_->Lookup(*before, kind)) {
-      ++impl_->counts.reused;
-      return *value;
-    }
-  }
-  std::string value = read(reader);
-  bool unchanged = trusted && reader.Identity() == before;
+  lookup.trusted =
+      lookup.before && lookup.before->modified <= latest && lookup.before->changed <= latest;
+  if (!lookup.trusted) return std::nullopt;
+  std::lock_guard lock(impl_->mutex);
+  std::optional<std::string> value = impl_->Lookup(*lookup.before, kind);
+  if (value) ++impl_->counts.reused;
+  return value;
+}
+
+void PropertyCache::Keep(fs::FileReader& reader, int kind, const Lookup& lookup,
+                         const std::string& value) {
+  bool unchanged = lookup.trusted && reader.Identity() == lookup.before;
   std::lock_guard lock(impl_->mutex);
   ++impl_->counts.read;
-  if (unchanged) impl_->Store(*before, kind, value);
-  return value;
+  if (unchanged) impl_->Store(*lookup.before, kind, value);
 }
 
 void PropertyCache::Flush() {

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "platform/fs/file_system.h"
@@ -52,6 +53,16 @@ class PropertyCache {
   // Virtual, so that the property readers reach it without linking the database code, which a
   // host without a cache does not build.
   virtual std::string Value(fs::FileReader& reader, int kind, const Read& read);
+
+  // Value in two halves, for a reader of many files at once. Stored gives the stored value, or
+  // nothing and what Keep needs; Keep is told the value then read from the same open file.
+  struct Lookup {
+    std::optional<fs::FileIdentity> before;
+    bool trusted = false;
+  };
+  virtual std::optional<std::string> Stored(fs::FileReader& reader, int kind, Lookup& lookup);
+  virtual void Keep(fs::FileReader& reader, int kind, const Lookup& lookup,
+                    const std::string& value);
 
   // Writes the pending stores to the database now.
   void Flush();

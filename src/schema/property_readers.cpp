@@ -1,9 +1,12 @@
 #include <algorithm>
 #include <array>
 #include <memory>
+#include <optional>
+#include <vector>
 
 #include "platform/failure.h"
 #include "platform/fs/long_read.h"
+#include "schema/lane_digests.h"
 #include "schema/md5_digest.h"
 #include "schema/pe_version.h"
 #include "schema/property_cache.h"
@@ -35,16 +38,7 @@ std::string Md5Hex(fs::FileReader& reader) {
     md5.Update(buffer.get(), got);
     offset += got;
   }
-  std::array<unsigned char, 16> digest = md5.Final();
-
-  static constexpr char kHex[] = "0123456789abcdef";
-  std::string text;
-  text.reserve(digest.size() * 2);
-  for (unsigned char byte : digest) {
-    text.push_back(kHex[byte >> 4]);
-    text.push_back(kHex[byte & 0xF]);
-  }
-  return text;
+  return DigestHex(md5.Final());
 }
 
 // `read` on the opened file, through the cache when one is in use.
@@ -54,7 +48,61 @@ std::string CachedRead(const fs::File& file, int kind, std::string (*read)(fs::F
   return cache ? cache->Value(*reader, kind, read) : read(*reader);
 }
 
+// Opens the files `next` gives and hashes those the cache has no value for in lanes; every file
+// ends in `done`.
+class TogetherFeed : public DigestFeed {
+ public:
+  TogetherFeed(const Schema::NextFile& next, const Schema::DigestDone& done)
+      : next_(next), done_(done) {}
+
+  fs::FileReader* Next() override {
+    while (const fs::File* file = next_()) {
+      try {
+        Open open{file, file->Open(), {}};
+        if (cache_) {
+          if (std::optional<std::string> stored = cache_->Stored(*open.reader, 3, open.lookup)) {
+            done_(*file, std::move(*stored), nullptr);
+            continue;
+          }
+        }
+        open_.push_back(std::move(open));
+        return open_.back().reader.get();
+      } catch (const fs::ReadAbandoned&) {
+        throw;
+      } catch (...) {
+        done_(*file, std::string(), std::current_exception());
+      }
+    }
+    return nullptr;
+  }
+
+  void Done(fs::FileReader& reader, std::string digest, std::exception_ptr failure) override {
+    auto open = std::find_if(open_.begin(), open_.end(),
+                             [&](const Open& o) { return o.reader.get() == &reader; });
+    Open ended = std::move(*open);
+    open_.erase(open);
+    if (!failure && cache_) cache_->Keep(reader, 3, ended.lookup, digest);
+    done_(*ended.file, std::move(digest), failure);
+  }
+
+ private:
+  struct Open {
+    const fs::File* file;
+    std::unique_ptr<fs::FileReader> reader;
+    PropertyCache::Lookup lookup;
+  };
+  const Schema::NextFile& next_;
+  const Schema::DigestDone& done_;
+  PropertyCache* cache_ = PropertyCacheInUse();
+  std::vector<Open> open_;  // one per busy lane
+};
+
 }  // namespace
+
+void Schema::ReadPropertyType3Together(const NextFile& next, const DigestDone& done) const {
+  TogetherFeed feed(next, done);
+  DigestInLanes(feed);
+}
 
 std::string Schema::ReadPropertyType1(const fs::File& file) const {
   return CachedRead(file, 1, ReadPeFileVersion);

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <exception>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -54,6 +56,13 @@ class Schema {
   int64_t ReadPropertyType2(const fs::File& file) const;
   std::string ReadPropertyType3(const fs::File& file) const;
   DateTime ReadPropertyType4(const fs::File& file) const;
+  // Property 3 of many files, hashed together (see DigestInLanes): `next` gives the files one at a
+  // time (nullptr: none waits now), and `done` is told each file's digest, or the failure reading
+  // it gave, as the file ends. fs::ReadAbandoned passes out.
+  using NextFile = std::function<const fs::File*()>;
+  using DigestDone =
+      std::function<void(const fs::File& file, std::string digest, std::exception_ptr failure)>;
+  void ReadPropertyType3Together(const NextFile& next, const DigestDone& done) const;
 
   // Appends <p p_type="1..4" p_value="..."/> for the property bit 1, 2, 4 or 8; any other bit fails
   // with kInvalidArgument (5).

@@ -12,6 +12,7 @@
 #include <string>
 #include <thread>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "platform/fs/posix/posix_file_system.h"
@@ -116,12 +117,15 @@ TEST_F(PropertyCacheTest, ASecondRunReadsOnlyWhatChanged) {
   tree_.AddFile("b", "other");
   auto fileSystem = fs::CreatePosixFileSystem({});
   Schema schema;
+  // "a" alone, "b" with the files hashed together.
   auto digests = [&] {
-    std::string text;
-    for (const char* name : {"a", "b"}) {
-      auto file = fileSystem->GetFile(tree_.Path(name));
-      text += schema.ReadPropertyType3(*file) + " ";
-    }
+    auto a = fileSystem->GetFile(tree_.Path("a"));
+    auto b = fileSystem->GetFile(tree_.Path("b"));
+    std::string text = schema.ReadPropertyType3(*a) + " ";
+    const fs::File* next = b.get();
+    schema.ReadPropertyType3Together(
+        [&] { return std::exchange(next, nullptr); },
+        [&](const fs::File&, std::string digest, std::exception_ptr) { text += digest; });
     return text;
   };
   auto run = [&] {
