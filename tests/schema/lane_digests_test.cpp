@@ -43,7 +43,7 @@ TEST(LaneDigestsTest, EveryKindOfLanesGivesTheSystemsDigest) {
     Md5Lanes lanes(kind);
     for (size_t first = 0; first < 130; first += Md5Lanes::kLanes) {
       std::string contents[Md5Lanes::kLanes];
-      unsigned char padded[Md5Lanes::kLanes][3 * Md5Lanes::kBlock];
+      unsigned char padded[Md5Lanes::kLanes][4 * Md5Lanes::kBlock];
       size_t blocks[Md5Lanes::kLanes];
       for (size_t lane = 0; lane < Md5Lanes::kLanes; ++lane) {
         std::string& content = contents[lane] = Content(first + lane, lane);
