@@ -156,7 +156,7 @@ bool Compare::MatchApplication(xml::Node a) {
   placesFound_.clear();
   exactPlacesFound_.clear();
   for (const xml::Node& v : versions) {
-    on([&] { highest = std::max(highest, ToInt32(TextOf(v, vocab::v_seq))); });
+    on([&] { highest = std::max(highest, ToInt32(TextViewOf(v, vocab::v_seq))); });
     if (MatchVersion(v)) found = true;
   }
   draftedVersions_.clear();

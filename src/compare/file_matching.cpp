@@ -154,8 +154,8 @@ bool Compare::UpdateFileDetails(xml::Node vResult, const FingerprintFile& f, int
   on([&] { copy.SetAttribute(vocab::f_exists, "1"); });
   if (explaining_) on([&] { KeepDisagreements(copy); });
   int32_t versionScore = 0, filesFound = 0;
-  on([&] { versionScore = ToInt32(TextOf(vResult, vocab::v_act)); });
-  on([&] { filesFound = ToInt32(TextOf(vResult, vocab::f_act)); });
+  on([&] { versionScore = ToInt32(TextViewOf(vResult, vocab::v_act)); });
+  on([&] { filesFound = ToInt32(TextViewOf(vResult, vocab::f_act)); });
   on([&] { vResult.SetAttribute(vocab::f_act, std::to_string(CheckedAdd(filesFound, 1))); });
   if (details.maxMask == mask) {
     on([&] {

@@ -31,8 +31,8 @@ const std::vector<FingerprintFile::Property>& FingerprintFile::Properties() cons
   int16_t kind = 0, weight = 0, bit = 0;
   for (const xml::Node& p : properties) {
     Property& property = read.emplace_back();
-    Try(property.readFailures, [&] { kind = ToInt16(TextOf(p, vocab::p_type)); });
-    Try(property.readFailures, [&] { weight = ToInt16(TextOf(p, vocab::p_weight)); });
+    Try(property.readFailures, [&] { kind = ToInt16(TextViewOf(p, vocab::p_type)); });
+    Try(property.readFailures, [&] { weight = ToInt16(TextViewOf(p, vocab::p_weight)); });
     Try(property.readFailures, [&] { bit = ToInt16(std::pow(2.0, weight - 1)); });
     property.kind = kind;
     property.bit = bit;
@@ -57,9 +57,9 @@ const std::vector<FingerprintFile::Property>& FingerprintFile::Properties() cons
 const FingerprintFile::Details& FingerprintFile::FindDetails() const {
   if (details_) return *details_;
   Details& details = details_.emplace(Details{});
-  Try(details.readFailures, [&] { details.id = ToInt32(TextOf(f_, vocab::f_id)); });
-  Try(details.readFailures, [&] { details.maxMask = ToInt16(TextOf(f_, vocab::p_max)); });
-  Try(details.readFailures, [&] { details.fileBit = ToInt16(TextOf(f_, vocab::f_bitmask)); });
+  Try(details.readFailures, [&] { details.id = ToInt32(TextViewOf(f_, vocab::f_id)); });
+  Try(details.readFailures, [&] { details.maxMask = ToInt16(TextViewOf(f_, vocab::p_max)); });
+  Try(details.readFailures, [&] { details.fileBit = ToInt16(TextViewOf(f_, vocab::f_bitmask)); });
   return details;
 }
 

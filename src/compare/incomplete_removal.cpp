@@ -46,8 +46,8 @@ void Compare::RemoveIncompleteVersions(xml::Node copy, int32_t highestSequence) 
     std::vector<xml::Node> versions;
     on([&] { versions = copy.ChildElements(vocab::v); });
     for (xml::Node& v : versions) {
-      on([&] { filesMax = ToInt32(TextOf(v, vocab::f_max)); });
-      on([&] { filesFound = ToInt32(TextOf(v, vocab::f_act)); });
+      on([&] { filesMax = ToInt32(TextViewOf(v, vocab::f_max)); });
+      on([&] { filesFound = ToInt32(TextViewOf(v, vocab::f_act)); });
       if (filesFound >= filesMax) continue;
       size_t missing = 0;
       on([&] {

@@ -23,7 +23,7 @@ double VersionWeight(const xml::Node& v) {
 double WeightOf(const xml::Node& v) { return ToDouble(TextOf(v, vocab::v_weight)); }
 
 int32_t MissingFilesOf(const xml::Node& v) {
-  int64_t missing = int64_t{ToInt32(TextOf(v, vocab::f_max))} - ToInt32(TextOf(v, vocab::f_act));
+  int64_t missing = int64_t{ToInt32(TextViewOf(v, vocab::f_max))} - ToInt32(TextViewOf(v, vocab::f_act));
   if (missing < INT32_MIN || missing > INT32_MAX) Fail(kOverflow);
   return static_cast<int32_t>(missing);
 }
@@ -31,7 +31,7 @@ int32_t MissingFilesOf(const xml::Node& v) {
 int32_t FileCountOf(const xml::Node& v) { return Int32Of(v, vocab::f_max); }
 
 int32_t Int32Of(const xml::Node& v, std::string_view attribute) {
-  return ToInt32(TextOf(v, attribute));
+  return ToInt32(TextViewOf(v, attribute));
 }
 
 int16_t CountVersions(const xml::Node& a) {

@@ -10,4 +10,10 @@ std::string TextOf(const xml::Node& node, std::string_view attribute) {
   return std::move(*value);
 }
 
+std::string_view TextViewOf(const xml::Node& node, std::string_view attribute) {
+  auto value = node.GetAttributeView(attribute);
+  if (!value) Fail(kInvalidUseOfNull);
+  return *value;
+}
+
 }  // namespace trl

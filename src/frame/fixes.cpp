@@ -90,7 +90,7 @@ void UpgradeFingerprintData(xml::Document& fingerprint) {
     std::vector<xml::Node> files;
     on([&] { files = v.GetElementsByTagName(vocab::f); });
     for (xml::Node f : files) {
-      on([&] { fileWeight = ToInt32(TextOf(f, vocab::f_weight)); });
+      on([&] { fileWeight = ToInt32(TextViewOf(f, vocab::f_weight)); });
       int32_t fileBit = CalculateWeightMask(fileWeight);
       on([&] { versionSum = CheckedAdd(versionSum, fileBit); });
       on([&] { f.SetAttribute(vocab::f_bitmask, std::to_string(fileBit)); });
@@ -99,7 +99,7 @@ void UpgradeFingerprintData(xml::Document& fingerprint) {
       std::vector<xml::Node> properties;
       on([&] { properties = f.ChildElements(vocab::p); });
       for (xml::Node p : properties) {
-        on([&] { propertyWeight = ToInt32(TextOf(p, vocab::p_weight)); });
+        on([&] { propertyWeight = ToInt32(TextViewOf(p, vocab::p_weight)); });
         int32_t propertyBit = CalculateWeightMask(propertyWeight);
         on([&] { fileSum = CheckedAdd(fileSum, propertyBit); });
         on([&] { p.SetAttribute(vocab::p_bitmask, std::to_string(propertyBit)); });

@@ -45,7 +45,7 @@ void Merge::MergeApplication(xml::Node application, xml::Node oldFolder, const D
 
   int32_t newId = 0;
   int32_t oldId = 0;
-  on([&] { newId = ToInt32(TextOf(application, vocab::v_id)); });
+  on([&] { newId = ToInt32(TextViewOf(application, vocab::v_id)); });
   on([&] { oldId = ToInt32(FixNulls(old.GetAttribute(vocab::v_id), std::string("0"))); });
   // No longer identified (old id 0 counts as identified: its versions were gone or unknown).
   if (newId == -1 && oldId != -1) on([&] { application.SetAttribute(vocab::a_update_q, "1"); });

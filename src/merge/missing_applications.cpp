@@ -31,7 +31,7 @@ bool Merge::MissingApplicationsRefresh() {
     bool selected = false;
     on([&] { selected = Use(objSchema).IsApplicationSelected(a, *objApplicationOptionsDOM); });
     if (!selected) continue;
-    on([&] { id = ToInt32(TextOf(a, vocab::a_id)); });
+    on([&] { id = ToInt32(TextViewOf(a, vocab::a_id)); });
     on([&] { folder = a.ParentNode(); });
     on([&] { drive = folder.ParentNode(); });
     on([&] { computer = drive.ParentNode(); });

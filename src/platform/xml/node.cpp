@@ -1,3 +1,4 @@
+#include <cstring>
 #include <string>
 
 #include "platform/failure.h"
@@ -36,6 +37,20 @@ pugi::xml_node RequireElement(const Node& node) {
   pugi::xml_node element = Require(node);
   if (element.type() != pugi::node_element) Fail(kInvalidArgument, "Only elements have attributes");
   return element;
+}
+
+// The attribute called `name`. The library's own search walks the attributes without a call per
+// attribute, but wants a terminated name: short names are copied to the stack for it.
+pugi::xml_attribute AttributeNamed(pugi::xml_node node, std::string_view name) {
+  char terminated[64];
+  if (name.size() < sizeof terminated && name.find('\0') == std::string_view::npos) {
+    std::memcpy(terminated, name.data(), name.size());
+    terminated[name.size()] = '\0';
+    return node.attribute(terminated);
+  }
+  pugi::xml_attribute attr = node.first_attribute();
+  while (attr && !TerminatedEquals(attr.name(), name)) attr = attr.next_attribute();
+  return attr;
 }
 
 // Fails unless `child` is a child of `parent`; returns it.
@@ -106,11 +121,8 @@ std::optional<std::string> Node::GetAttribute(std::string_view name) const {
 }
 
 std::optional<std::string_view> Node::GetAttributeView(std::string_view name) const {
-  // A walk of the attributes needs no terminated copy of the name.
-  for (pugi::xml_attribute attr = Require(*this).first_attribute(); attr;
-       attr = attr.next_attribute()) {
-    if (TerminatedEquals(attr.name(), name)) return std::string_view(attr.value());
-  }
+  pugi::xml_attribute attr = AttributeNamed(Require(*this), name);
+  if (attr) return std::string_view(attr.value());
   return std::nullopt;
 }
 
@@ -118,8 +130,7 @@ void Node::SetAttribute(std::string_view name, std::string_view value) {
   pugi::xml_node node = RequireElement(*this);
   CheckText(value);
   Document::Impl& impl = *document_->impl_;
-  pugi::xml_attribute attr = node.first_attribute();
-  while (attr && !TerminatedEquals(attr.name(), name)) attr = attr.next_attribute();
+  pugi::xml_attribute attr = AttributeNamed(node, name);
   // A detached element is in no index yet: it joins its parent's when it is placed.
   bool indexed = node.parent() != impl.holder;
   bool written = false;
