@@ -38,7 +38,7 @@ build_dir="${1:-$here/build}"
 packages=(
   g++ cmake ninja-build pkg-config
   libpugixml-dev libpcre2-dev libutf8proc-dev libssl-dev libfmt-dev libcli11-dev nlohmann-json3-dev
-  libsqlite3-dev zlib1g-dev
+  libsqlite3-dev zlib1g-dev libmimalloc-dev
 )
 if ((tests)); then
   packages+=(libgtest-dev libgmock-dev)
