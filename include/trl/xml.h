@@ -62,6 +62,9 @@ class TRL_API Node {
   std::vector<Node> GetElementsByTagName(std::string_view tag) const;
   // How many of them there are, without listing them.
   size_t CountElementsByTagName(std::string_view tag) const;
+  // The first of them that `accept` takes, or no object; the walk stops there.
+  Node FirstElementByTagName(std::string_view tag,
+                             const std::function<bool(const Node&)>& accept) const;
 
   // Tree changes. A node of this document moves (handles to it stay valid); a node of another
   // document is copied here and removed from its own document: use the returned handle.

@@ -31,10 +31,8 @@ constexpr int32_t kSearchMode = 1;
 xml::Node FirstLocalComputer(xml::Node root) {
   auto isLocal = [](const xml::Node& c) { return c.GetAttribute(vocab::c_local) == "1"; };
   if (root.NodeName() == vocab::c && isLocal(root)) return root;
-  for (const xml::Node& c : root.GetElementsByTagName(vocab::c)) {
-    if (isLocal(c)) return c;
-  }
-  return {};
+  // Usually the first computer: the walk ends there rather than at the last of a million files.
+  return root.FirstElementByTagName(vocab::c, isLocal);
 }
 
 }  // namespace

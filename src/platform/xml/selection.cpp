@@ -93,4 +93,26 @@ size_t Node::CountElementsByTagName(std::string_view tag) const {
   return count;
 }
 
+Node Node::FirstElementByTagName(std::string_view tag,
+                                 const std::function<bool(const Node&)>& accept) const {
+  pugi::xml_node node = Require(*this);
+  Document::Impl& impl = *document_->impl_;
+  if (auto below = impl.descendants.Below(node, tag)) {
+    for (uint32_t position : *below) {
+      Node at = impl.Wrap(impl.descendants.At(position));
+      if (accept(at)) return at;
+    }
+    return {};
+  }
+  for (pugi::xml_node at = NextInSubtree(node, node); at && at != impl.holder;
+       at = NextInSubtree(at, node)) {
+    if (at.type() != pugi::node_element || !(tag == "*" || TerminatedEquals(at.name(), tag))) {
+      continue;
+    }
+    Node wrapped = impl.Wrap(at);
+    if (accept(wrapped)) return wrapped;
+  }
+  return {};
+}
+
 }  // namespace trl::xml

@@ -329,6 +329,16 @@ TEST(XmlDocumentTest, ChildrenNamesAndText) {
   EXPECT_EQ(doc.Xml(), "<r/>");
 }
 
+// The first element taken is the first in document order, nested ones included; none taken is
+// no object.
+TEST(XmlDocumentTest, FirstElementByTagNameWalksInDocumentOrder) {
+  Document doc;
+  Load(doc, "<r><a><c l=\"0\"/><c l=\"1\" n=\"1\"/></a><c l=\"1\" n=\"2\"/></r>");
+  auto labelled = [](const Node& c) { return c.GetAttribute("l") == "1"; };
+  EXPECT_EQ(doc.DocumentElement().FirstElementByTagName("c", labelled).GetAttribute("n"), "1");
+  EXPECT_TRUE(doc.AsNode().FirstElementByTagName("c", [](const Node&) { return false; }).IsNull());
+}
+
 // In a chain of nested elements, each asked for the elements below it, every level gets what a
 // walk of its subtree gives, in one walk of the chain rather than one per level (the test's time
 // limit sees the difference), also once the tree changes.
@@ -354,6 +364,10 @@ TEST(XmlDocumentTest, FindsElementsBelowEachLevelOfADeepChain) {
       const std::vector<Node>& below = level == 0 ? top : level <= kDepth / 2 ? upper : lower;
       ASSERT_EQ(chain[level].GetElementsByTagName("y"), below) << level;
       ASSERT_EQ(chain[level].CountElementsByTagName("y"), below.size()) << level;
+      Node wanted = below.empty() ? Node() : below.back();
+      ASSERT_EQ(chain[level].FirstElementByTagName("y", [&](const Node& y) { return y == wanted; }),
+                wanted)
+          << level;
     }
   };
   expect({middle, bottom, last}, {middle, bottom}, {bottom});
