@@ -81,7 +81,15 @@ class TogetherFeed : public DigestFeed {
                              [&](const Open& o) { return o.reader.get() == &reader; });
     Open ended = std::move(*open);
     open_.erase(open);
-    if (!failure && cache_) cache_->Keep(reader, 3, ended.lookup, digest);
+    if (!failure && cache_) {
+      try {
+        cache_->Keep(reader, 3, ended.lookup, digest);
+      } catch (...) {
+        // As for a file read alone: what fails while its value is stored fails its read.
+        failure = std::current_exception();
+        digest.clear();
+      }
+    }
     done_(*ended.file, std::move(digest), failure);
   }
 

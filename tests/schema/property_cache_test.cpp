@@ -15,14 +15,17 @@
 #include <utility>
 #include <vector>
 
+#include "platform/failure.h"
 #include "platform/fs/posix/posix_file_system.h"
 #include "schema/schema.h"
+#include "support/failure_of.h"
 #include "support/temp_tree.h"
 
 namespace trl {
 namespace {
 
 using Identity = fs::FileIdentity;
+using testing::FailureOf;
 using namespace std::chrono_literals;
 
 // A reader that reads nothing and tells the identity it is given.
@@ -163,6 +166,34 @@ struct LockHolder {
   ~LockHolder() { sqlite3_close_v2(db); }
   sqlite3* db = nullptr;
 };
+
+// A value that cannot be stored fails its file's read, hashed alone or with others, rather than
+// leaving the thread that hashed it.
+TEST_F(PropertyCacheTest, AStoreThatFailsFailsTheRead) {
+  struct Refusing : PropertyCache {
+    using PropertyCache::PropertyCache;
+    void Keep(fs::FileReader&, int, const Lookup&, const std::string&) override {
+      Fail(kOutOfMemory);
+    }
+  };
+  tree_.AddFile("a", "first");
+  auto file = fs::CreatePosixFileSystem({})->GetFile(tree_.Path("a"));
+  Refusing cache(path_, [](const std::string&) {});
+  UsePropertyCache(&cache);
+  Schema schema;
+  const fs::File* next = file.get();
+  int32_t together = 0;
+  schema.ReadPropertyType3Together([&] { return std::exchange(next, nullptr); },
+                                   [&](const fs::File&, std::string, std::exception_ptr failure) {
+                                     if (failure)
+                                       together =
+                                           FailureOf([&] { std::rethrow_exception(failure); });
+                                   });
+  int32_t alone = FailureOf([&] { schema.ReadPropertyType3(*file); });
+  UsePropertyCache(nullptr);
+  EXPECT_EQ(together, kOutOfMemory);
+  EXPECT_EQ(alone, kOutOfMemory);
+}
 
 TEST_F(PropertyCacheTest, AnUnusableDatabaseIsReportedOnceAndFilesAreRead) {
   const std::pair<const char*, std::function<std::shared_ptr<void>()>> cases[] = {
