@@ -23,7 +23,8 @@ double VersionWeight(const xml::Node& v) {
 double WeightOf(const xml::Node& v) { return ToDouble(TextOf(v, vocab::v_weight)); }
 
 int32_t MissingFilesOf(const xml::Node& v) {
-  int64_t missing = int64_t{ToInt32(TextViewOf(v, vocab::f_max))} - ToInt32(TextViewOf(v, vocab::f_act));
+  int64_t missing =
+      int64_t{ToInt32(TextViewOf(v, vocab::f_max))} - ToInt32(TextViewOf(v, vocab::f_act));
   if (missing < INT32_MIN || missing > INT32_MAX) Fail(kOverflow);
   return static_cast<int32_t>(missing);
 }

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <map>
 #include <memory>
+#include <random>
 #include <string>
 #include <vector>
 
@@ -30,10 +31,12 @@ std::vector<size_t> Lengths() {
   return lengths;
 }
 
-std::string Content(size_t length, size_t seed) {
-  std::string content(length, '\0');
-  for (size_t i = 0; i < length; ++i) content[i] = static_cast<char>((i * 131 + seed * 7) % 251);
-  return content;
+// Bytes that differ from one file to the next and along each file.
+std::string Bytes(size_t length, size_t file) {
+  std::string bytes(length, '\0');
+  std::minstd_rand next(static_cast<uint32_t>(file) + 1);
+  for (char& byte : bytes) byte = static_cast<char>(next());
+  return bytes;
 }
 
 // Each instruction set the processor has gives the system's digests, lanes ending at different
@@ -46,7 +49,7 @@ TEST(LaneDigestsTest, EveryKindOfLanesGivesTheSystemsDigest) {
       unsigned char padded[Md5Lanes::kLanes][4 * Md5Lanes::kBlock];
       size_t blocks[Md5Lanes::kLanes];
       for (size_t lane = 0; lane < Md5Lanes::kLanes; ++lane) {
-        std::string& content = contents[lane] = Content(first + lane, lane);
+        std::string& content = contents[lane] = Bytes(first + lane, lane);
         size_t whole = content.size() / Md5Lanes::kBlock * Md5Lanes::kBlock;
         std::memcpy(padded[lane], content.data(), content.size());
         unsigned char tail[2 * Md5Lanes::kBlock];
@@ -81,7 +84,7 @@ TEST(LaneDigestsTest, EveryKindOfLanesGivesTheSystemsDigest) {
 TEST(LaneDigestsTest, EveryFileGetsTheDigestItHasAloneOrItsFailure) {
   std::vector<std::unique_ptr<MemoryFile>> files;
   for (size_t length : Lengths()) {
-    files.push_back(std::make_unique<MemoryFile>("f", Content(length, files.size())));
+    files.push_back(std::make_unique<MemoryFile>("f", Bytes(length, files.size())));
     if (files.size() % 3 == 0) files.back()->SetMaxRead(4093);  // short reads are continued
   }
   for (size_t at : {size_t{5}, size_t{77}, size_t{206}}) {
